@@ -1,0 +1,40 @@
+# Front door of the build. `make` builds the release configuration, `make test`
+# builds it and runs the whole suite. Both install missing Debian packages first.
+JOBS ?= $(shell nproc)
+FUZZ_SECONDS ?= 60
+BUILD := build/release
+ASAN_BUILD := build/asan
+FUZZ_BUILD := build/fuzz
+
+.PHONY: all deps test test-asan fuzz clean
+
+all: deps
+	cmake -S . -B $(BUILD) -DCMAKE_BUILD_TYPE=Release >/dev/null
+	cmake --build $(BUILD) -j $(JOBS)
+
+deps:
+	@scripts/install-deps
+
+test: all
+	ctest --test-dir $(BUILD) --output-on-failure -j $(JOBS)
+
+# The whole suite under AddressSanitizer and UndefinedBehaviorSanitizer.
+test-asan: deps
+	cmake -S . -B $(ASAN_BUILD) -DCMAKE_BUILD_TYPE=Debug -DBW_SANITIZE=ON >/dev/null
+	cmake --build $(ASAN_BUILD) -j $(JOBS)
+	ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
+	LSAN_OPTIONS=suppressions=$(CURDIR)/tests/asan.supp:print_suppressions=0 \
+	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
+	ctest --test-dir $(ASAN_BUILD) --output-on-failure -j $(JOBS)
+
+# The parameter parser under libFuzzer for FUZZ_SECONDS seconds.
+fuzz:
+	@scripts/install-deps fuzz
+	CC=clang CXX=clang++ cmake -S . -B $(FUZZ_BUILD) -DCMAKE_BUILD_TYPE=Debug -DBW_FUZZ=ON -DBW_TESTS=OFF >/dev/null
+	cmake --build $(FUZZ_BUILD) -j $(JOBS) --target kvt_fuzz
+	mkdir -p $(FUZZ_BUILD)/corpus
+	$(FUZZ_BUILD)/tests/fuzz/kvt_fuzz -max_total_time=$(FUZZ_SECONDS) -max_len=4096 \
+	    $(FUZZ_BUILD)/corpus tests/fuzz/corpus
+
+clean:
+	rm -rf build

@@ -1,0 +1,99 @@
+// The parameter library: a parameter file held in memory as a tree of
+// targets, sections (nested to any depth), keywords and parameters.
+//
+// File syntax:
+//   # a comment runs from '#' to the end of the line
+//   TARGET_NAME {                 a target: a name and a block
+//       Section {                 sections nest to any depth
+//           Key = 1, 2.5, true    one keyword a line, one or more parameters
+//           Text = "a \"b\" \\"   text: double quotes, \" and \\ inside
+//           Data = file("x.nc")   a file name, relative to the file's folder
+//       }
+//   }
+// Names are a letter or '_' followed by letters, digits and '_', matched as
+// written. Integers are like -12; reals hold a '.' or an exponent (0.05,
+// 1.0e-4, 3.), or are inf, -inf or nan; logicals are true or false in any
+// letter case. Names of equal spelling count as instances 1, 2, ... in file
+// order, and the order of everything is kept.
+//
+// Handles are opaque 64-bit values; 0 means absent. Every look-up and value
+// call sets the global error code: 0 on success, else one of the codes below.
+// kvtPeekErrorGlb reads it without clearing it.
+#pragma once
+
+#include <cstdint>
+
+using KvtHandle = uint64_t;
+
+constexpr int kKvtOk = 0;
+constexpr int kKvtErrFile = 1001;      // the file can't be read or written
+constexpr int kKvtErrHandle = 1002;    // a null, closed or unfit handle
+constexpr int kKvtErrSyntax = 1003;    // a syntax error in a loaded file
+constexpr int kKvtErrNotFound = 1004;  // a look-up found nothing
+constexpr int kKvtErrKind = 1005;      // a parameter of another kind than asked
+constexpr int kKvtErrRange = 1006;     // an integer outside the 32-bit range
+constexpr int kKvtErrName = 1007;      // a name that breaks the naming rule
+constexpr int kKvtErrBuild = 1008;     // a building call out of order
+
+// Reading.
+// Loads a file; the option word has no meaning. A syntax error still gives a
+// handle (of what was read before it) with the error code 1003 pending.
+// Returns 0 when the file can't be read.
+KvtHandle kvtLoadFile(const char* path, int option, KvtHandle* file);
+// Parses a text as if it were the file at path (path sets the folder that
+// relative file names are resolved against).
+KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHandle* file);
+int kvtPeekErrorGlb();
+// The last syntax error: line and column from 1, and a short text of what was expected.
+void kvtGetSyntaxErr(KvtHandle file, int* line, int* column, const char** text);
+
+KvtHandle kvtTargetByNameNum(KvtHandle file, const char* name, int instance);
+KvtHandle kvtSectionByNameNum(KvtHandle parent, const char* name, int instance);
+KvtHandle kvtKeywordByNameNum(KvtHandle section, const char* name, int instance);
+KvtHandle kvtParamByNum(KvtHandle keyword, int number);
+
+// Depth in the tree: a target is at level 0, its sections at 1, and so on.
+int kvtGetLevel(KvtHandle node);
+// The path from the target down, names joined by '.': "TARGET.Section.Sub".
+const char* kvtGetNameGlb(KvtHandle node);
+// The name of a target, section or keyword.
+const char* kvtGetName(KvtHandle node);
+
+bool kvtIsInt(KvtHandle param);
+bool kvtIsReal(KvtHandle param);
+bool kvtIsBool(KvtHandle param);
+bool kvtIsString(KvtHandle param);
+bool kvtIsFilename(KvtHandle param);
+
+// Values. An integer may be read as a real; a text may be read as a file
+// name. Every other mismatch sets kKvtErrKind and returns 0, false or null.
+int32_t kvtGetInt(KvtHandle param);
+float kvtGetFloat(KvtHandle param);
+double kvtGetDouble(KvtHandle param);
+bool kvtGetBool(KvtHandle param);
+const char* kvtGetString(KvtHandle param);
+const char* kvtGetFilename(KvtHandle param);
+// The file name as a full path (at most 2047 characters): relative names are
+// taken from the folder of the file that holds them; absolute ones stay.
+const char* kvtGetResultFilenamePath(KvtHandle param);
+
+// Ends a tree, loaded or built, and sets the handle to 0.
+void kvtClose(KvtHandle* file);
+
+// Writing.
+KvtHandle kvtCreate(KvtHandle* file);
+int kvtAddTarget(KvtHandle file, const char* name);
+int kvtAddSection(KvtHandle file, const char* name);
+// Ends the section (or target) opened last.
+int kvtEndSection(KvtHandle file);
+int kvtAddKeyword(KvtHandle file, const char* name);
+// Each adds one more parameter to the keyword added last.
+int kvtAddInt(KvtHandle file, int32_t value);
+int kvtAddFloat(KvtHandle file, float value);
+int kvtAddDouble(KvtHandle file, double value);
+int kvtAddBool(KvtHandle file, bool value);
+int kvtAddString(KvtHandle file, const char* value);
+int kvtAddFilename(KvtHandle file, const char* value);
+// Writes the tree in the syntax above, four blanks a level; doubles with 17
+// and 32-bit reals with 9 significant digits, so that it loads back the same.
+int kvtWrite(KvtHandle file, const char* path);

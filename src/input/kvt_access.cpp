@@ -1,0 +1,289 @@
+#include "input/kvt_access.hpp"
+
+#include <cstdio>
+#include <cstdlib>
+#include <ctime>
+#include <type_traits>
+
+#include "input/kvt_common.hpp"
+#include "run/messages.hpp"
+#include "run/process.hpp"
+#include "run/units.hpp"
+
+KvtAccessState gKvtAccess;
+
+namespace {
+
+void WriteDateAndTime() {
+    const std::time_t now = std::time(nullptr);
+    std::tm local{};
+    localtime_r(&now, &local);
+    char date[16], time[16];
+    std::strftime(date, sizeof date, "%Y%m%d", &local);
+    std::strftime(time, sizeof time, "%H%M%S", &local);
+    KvtLogLine(std::string(60, ' ') + date);
+    KvtLogLine(std::string(60, ' ') + time);
+}
+
+std::string Indent(KvtHandle section) {
+    const int level = kvtGetLevel(section);
+    return std::string(2 * static_cast<size_t>(level + 1), ' ');
+}
+
+std::string FitWidth(std::string text, int width) {
+    if (width > 0) text.resize(static_cast<size_t>(width), ' ');
+    return text;
+}
+
+}  // namespace
+
+void KvtLogLine(std::string_view text) {
+    if (gKvtAccess.logUnit <= 0) return;
+    FILE* log = UnitFile(gKvtAccess.logUnit);
+    if (log == nullptr) return;
+    text = TrimRight(text);
+    std::fwrite(text.data(), 1, text.size(), log);
+    std::fputc('\n', log);
+    std::fflush(log);
+}
+
+std::string LogFileName(std::string_view path) {
+    std::string name(TrimRight(path));
+    const size_t slash = name.find_last_of('/');
+    const size_t dot = name.rfind('.');
+    if (dot != std::string::npos && (slash == std::string::npos || dot > slash)) name.erase(dot);
+    return ProcessFileStem(name) + ".log";
+}
+
+KvtHandle KvtOpenFile(std::string_view path, bool makeLog, int* status) {
+    const std::string name(TrimRight(path));
+    KvtHandle file = 0;
+    kvtLoadFile(name.c_str(), -1, &file);
+    if (file == 0) {
+        if (status != nullptr) {
+            *status = -1;
+            return 0;
+        }
+        StopRun("KVT file: " + name + "not found");
+    }
+    if (makeLog) {
+        gKvtAccess.logName = LogFileName(name);
+        const int unit = GetFreeUnit();
+        if (unit > 0 && OpenUnit(unit, gKvtAccess.logName, "w")) {
+            gKvtAccess.logUnit = unit;
+            WriteDateAndTime();
+        } else {
+            if (unit > 0) ReleaseUnit(unit);
+            gKvtAccess.logUnit = -1;
+        }
+    }
+    if (status != nullptr) *status = 0;
+    return file;
+}
+
+KvtHandle KvtOpenTarget(KvtHandle file, std::string_view name, int instance, int* status) {
+    const std::string target(TrimRight(name));
+    KvtLogLine("");
+    KvtLogLine("");
+    KvtLogLine(std::string(70, '='));
+    KvtLogLine("Target: " + target);
+    KvtLogLine("");
+    const KvtHandle handle = kvtTargetByNameNum(file, target.c_str(), instance);
+    if (handle == 0) {
+        if (status == nullptr) StopRun("KVT target: " + target + " not found");
+        *status = -1;
+        return 0;
+    }
+    if (status != nullptr) *status = 0;
+    return handle;
+}
+
+KvtHandle KvtOpenSection(KvtHandle parent, std::string_view name, int instance, int* status) {
+    const std::string section(TrimRight(name));
+    WriteSectionHeading(parent, section);
+    const KvtHandle handle = kvtSectionByNameNum(parent, section.c_str(), instance);
+    if (handle == 0) {
+        if (status == nullptr) StopRun("KVT section: " + section + " not found");
+        *status = -1;
+        return 0;
+    }
+    if (status != nullptr) *status = 0;
+    return handle;
+}
+
+void WriteSectionHeading(KvtHandle parent, const std::string& section) {
+    if (gKvtAccess.logUnit <= 0) return;
+    KvtLogLine("");
+    KvtLogLine("");
+    const int level = parent != 0 ? kvtGetLevel(parent) : 0;
+    std::string heading = std::string(2 * static_cast<size_t>(level > 0 ? level : 0), ' ') +
+                          "Section: " + section;
+    if (heading.size() > 128) heading.resize(128);
+    heading += ' ';
+    if (heading.size() < 70) heading.append(70 - heading.size(), '-');
+    KvtLogLine(heading);
+}
+
+int KvtGetParam(KvtHandle keyword, int param, KvtKind kind, KvtFetched& out) {
+    int code = kvtPeekErrorGlb();
+    if (code != 0) return code;
+    const KvtHandle p = kvtParamByNum(keyword, param);
+    if (p == 0) return 1;
+    const char* text = nullptr;
+    switch (kind) {
+        case KvtKind::Double:
+        case KvtKind::Real: out.number = kvtGetDouble(p); break;
+        case KvtKind::Integer: out.integer = kvtGetInt(p); break;
+        case KvtKind::Logical:
+            if (kvtIsInt(p)) out.logical = kvtGetInt(p) != 0;
+            else out.logical = kvtGetBool(p);
+            break;
+        case KvtKind::String:
+            if (kvtIsString(p)) text = kvtGetString(p);
+            else if (kvtIsFilename(p)) text = kvtGetFilename(p);
+            else text = kvtGetString(p);  // sets the wrong-kind code
+            break;
+        case KvtKind::Filename: text = kvtGetResultFilenamePath(p); break;
+    }
+    code = kvtPeekErrorGlb();
+    if (code == 0 && (kind == KvtKind::String || kind == KvtKind::Filename)) {
+        if (text == nullptr) return 1;
+        out.text = text;
+    }
+    return code;
+}
+
+int KvtGetKey(KvtHandle section, std::string_view key, int instance, int param, KvtKind kind,
+              KvtFetched& out, std::string& echo, bool& present) {
+    const std::string name(TrimRight(key));
+    echo = Indent(section) + name + " : ";
+    const KvtHandle keyword = kvtKeywordByNameNum(section, name.c_str(), instance);
+    present = keyword != 0;
+    if (!present) return 1;
+    return KvtGetParam(keyword, param, kind, out);
+}
+
+std::string LogicalText(bool value) { return value ? "True" : "False"; }
+
+std::string PathForEcho(const std::string& path) {
+    const char* noPath = std::getenv("TRNLIB_LOG_NOPATH");
+    if (noPath == nullptr || noPath[0] == '\0') return path;
+    const size_t sep = path.find_last_of("/\\");
+    return sep == std::string::npos ? path : path.substr(sep + 1);
+}
+
+// Ends a getter: the echo line and the status.
+void FinishGetter(std::string& echo, bool present, int code, const std::string& valueText,
+                  const std::string& defaultText, int* status) {
+    if (present && code == 0) echo += valueText;
+    else if (!present) echo += defaultText + " (default)";
+    KvtLogLine(echo);
+    if (status != nullptr) *status = present ? code : 1;
+}
+
+void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance, int param,
+                  int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::Double, f, echo, present);
+    if (present && code == 0) value = f.number;
+    FinishGetter(echo, present, code, NumberText(f.number), NumberText(value), status);
+}
+
+void KvtGetReal(KvtHandle section, std::string_view key, float& value, int instance, int param,
+                int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::Real, f, echo, present);
+    if (present && code == 0) value = static_cast<float>(f.number);
+    FinishGetter(echo, present, code, NumberText(f.number), NumberText(static_cast<double>(value)),
+                 status);
+}
+
+void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance,
+                   int param, int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::Integer, f, echo, present);
+    if (present && code == 0) value = f.integer;
+    FinishGetter(echo, present, code, std::to_string(f.integer), std::to_string(value), status);
+}
+
+void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int instance, int param,
+                   int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::Logical, f, echo, present);
+    if (present && code == 0) value = f.logical;
+    FinishGetter(echo, present, code, LogicalText(f.logical), LogicalText(value), status);
+}
+
+void KvtGetString(KvtHandle section, std::string_view key, std::string& value, int width,
+                  int instance, int param, int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::String, f, echo, present);
+    if (present && code == 0) value = FitWidth(f.text, width);
+    FinishGetter(echo, present, code, std::string(TrimRight(f.text)),
+                 std::string(TrimRight(value)), status);
+}
+
+void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width,
+                    int instance, int param, int* status) {
+    KvtFetched f;
+    std::string echo;
+    bool present = false;
+    const int code = KvtGetKey(section, key, instance, param, KvtKind::Filename, f, echo, present);
+    if (present && code == 0) value = FitWidth(f.text, width);
+    FinishGetter(echo, present, code, PathForEcho(std::string(TrimRight(f.text))),
+                 std::string(TrimRight(value)), status);
+}
+
+namespace {
+
+template <typename T>
+void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtKind kind,
+             int* status) {
+    const std::string name(TrimRight(key));
+    std::string echo = Indent(section) + name + " : ";
+    const KvtHandle keyword = kvtKeywordByNameNum(section, name.c_str(), 1);
+    auto text = [](T v) {
+        if constexpr (std::is_same_v<T, double>) return NumberText(v);
+        else return std::to_string(v);
+    };
+    if (keyword == 0) {
+        for (int i = 0; i < count; ++i) echo += text(values[i]) + " ";
+        echo = std::string(TrimRight(echo)) + " (default)";
+        KvtLogLine(echo);
+        if (status != nullptr) *status = 1;
+        return;
+    }
+    int code = 0;
+    for (int i = 0; i < count; ++i) {
+        KvtFetched f;
+        code = KvtGetParam(keyword, i + 1, kind, f);
+        if (code != 0) continue;
+        if constexpr (std::is_same_v<T, double>) values[i] = f.number;
+        else values[i] = f.integer;
+        echo += text(values[i]) + " ";
+    }
+    KvtLogLine(echo);
+    if (status != nullptr) *status = code;
+}
+
+}  // namespace
+
+void KvtGetIntegerList(KvtHandle section, std::string_view key, int32_t* values, int count,
+                       int* status) {
+    GetList(section, key, values, count, KvtKind::Integer, status);
+}
+
+void KvtGetDoubleList(KvtHandle section, std::string_view key, double* values, int count,
+                      int* status) {
+    GetList(section, key, values, count, KvtKind::Double, status);
+}

@@ -1,0 +1,64 @@
+// Parameter access layer, explicit face: every setting of the model file is
+// read through these calls, which add to the bare parameter library
+//  - a default for every key: what the value holds on entry stands when the
+//    key is absent, and an absent key is never an error;
+//  - a fatal stop on a missing file, target or section, unless the caller
+//    passes a status and decides for itself;
+//  - an echo of every value into the run's log, defaults marked " (default)",
+//    so that the log records every setting in force;
+//  - values in the model's own widths.
+// A status, where given, is 0 when the key was there and its value taken,
+// 1 when it was absent or has no such parameter, else the library's code.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+
+#include "platform/kvt/kvt.hpp"
+
+struct KvtAccessState {
+    int logUnit = -1;        // above 0: the log is open and values are echoed
+    std::string logName;     // the log's path, once opened
+    KvtHandle currentFile = 0;  // the file and node of the current-section face
+    KvtHandle currentNode = 0;
+    int targetInstance = 1;  // the instance last given to the current face's KvtOpenTarget
+};
+extern KvtAccessState gKvtAccess;
+
+// Loads the parameter file and, with makeLog, opens the log beside it: the
+// path with its extension replaced by ".log" (appended where there is none),
+// and "_p" with the process id behind the stem under a launcher.
+KvtHandle KvtOpenFile(std::string_view path, bool makeLog, int* status = nullptr);
+// The log's name for a parameter file path.
+std::string LogFileName(std::string_view path);
+
+KvtHandle KvtOpenTarget(KvtHandle file, std::string_view name, int instance = 1,
+                        int* status = nullptr);
+KvtHandle KvtOpenSection(KvtHandle parent, std::string_view name, int instance = 1,
+                         int* status = nullptr);
+
+void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance = 1,
+                  int param = 1, int* status = nullptr);
+void KvtGetReal(KvtHandle section, std::string_view key, float& value, int instance = 1,
+                int param = 1, int* status = nullptr);
+void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance = 1,
+                   int param = 1, int* status = nullptr);
+void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int instance = 1,
+                   int param = 1, int* status = nullptr);
+// Texts and paths: width > 0 cuts the value to that many characters and pads
+// it with blanks, as the fixed-width fields of the model (paths 256, titles 40 or 80).
+void KvtGetString(KvtHandle section, std::string_view key, std::string& value, int width = 0,
+                  int instance = 1, int param = 1, int* status = nullptr);
+// The value is the full path of the file name; the echo shows only the name
+// behind the last folder separator when TRNLIB_LOG_NOPATH is set.
+void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width = 0,
+                    int instance = 1, int param = 1, int* status = nullptr);
+// Parameters 1 to count of the first instance of the key.
+void KvtGetIntegerList(KvtHandle section, std::string_view key, int32_t* values, int count,
+                       int* status = nullptr);
+void KvtGetDoubleList(KvtHandle section, std::string_view key, double* values, int count,
+                      int* status = nullptr);
+
+// Writes one line into the log of this layer (nothing when it is not open).
+void KvtLogLine(std::string_view text);

@@ -1,0 +1,121 @@
+#include "run/run_sequence.hpp"
+
+#include <cstdlib>
+#include <cstring>
+
+#include "input/kvt_access.hpp"
+#include "input/model_setup.hpp"
+#include "run/fpmode.hpp"
+#include "run/messages.hpp"
+#include "run/process.hpp"
+#include "run/progress.hpp"
+#include "run/run_state.hpp"
+#include "run/timing.hpp"
+#include "run/units.hpp"
+
+RunState gRun;
+
+namespace {
+
+// The integer behind "-debug:"; the level stays as it is when that is no number.
+void ReadDebugLevel(const char* text, int& debugLevel) {
+    char* end = nullptr;
+    const long level = std::strtol(text, &end, 10);
+    while (end != nullptr && *end == ' ') ++end;
+    if (end != text && end != nullptr && *end == '\0') debugLevel = static_cast<int>(level);
+}
+
+[[noreturn]] void StopOnSyntaxError(const std::string& fileName) {
+    int line = 0, column = 0;
+    const char* text = nullptr;
+    kvtGetSyntaxErr(gRun.parameterFileHandle, &line, &column, &text);
+    std::string message(TrimRight(text != nullptr ? text : "syntax error"));
+    message = std::string(TrimRight(message)) + Filled(" near line %", line);
+    message = std::string(TrimRight(message)) + Filled(" and colum %", column);
+    message = std::string(TrimRight(message)) + Filled(" in file %", fileName);
+    StopRun(message);
+}
+
+}  // namespace
+
+std::string ParseArguments(int argc, const char* const* argv, int& debugLevel) {
+    std::string name;
+    for (int i = 1; i < argc; ++i) {
+        const char* arg = argv[i];
+        if (std::strncmp(arg, "-debug", 6) == 0) {
+            debugLevel = 1;
+            if (arg[6] == ':') ReadDebugLevel(arg + 7, debugLevel);
+            name.clear();
+        } else if (strcasecmp(arg, "//hud") == 0) {
+            continue;  // the viewer's switch: the channel is always there
+        } else {
+            name = arg;
+        }
+    }
+    return std::string(Trim(name));
+}
+
+std::string ChannelName(std::string_view fileName) {
+    const std::string name(Trim(fileName));
+    const size_t lower = name.rfind(".bw");
+    const size_t upper = name.rfind(".BW");
+    size_t cut = std::string::npos;
+    if (lower != std::string::npos) cut = lower;
+    if (upper != std::string::npos && (cut == std::string::npos || upper > cut)) cut = upper;
+    return cut == std::string::npos ? name : name.substr(0, cut);
+}
+
+void ReadCommandLine(int argc, const char* const* argv) {
+    ProcessStart();
+    gRun.debugLevel = 0;
+    const std::string fileName = ParseArguments(argc, argv, gRun.debugLevel);
+    if (fileName.empty()) StopRun(kUsage);
+    gRun.parameterFileName = fileName;
+
+    OpenProgressChannel(ChannelName(fileName));
+    ProgressValue(0);
+
+    int status = 0;
+    gRun.parameterFileHandle = KvtOpenFile(fileName, true, &status);
+    if (status != 0) StopRun(std::string(kProgramTitle) + ": Unable to open " + fileName);
+    SetLogUnit(gKvtAccess.logUnit);
+    if (kvtPeekErrorGlb() == kKvtErrSyntax) StopOnSyntaxError(fileName);
+    WriteComputingEnvironment();
+}
+
+void Shutdown(const std::string& /*fileName*/, int exitCode) {
+    WritePerformance();
+    if (gBasic.numberOfDimensions > 1) kvtClose(&gRun.parameterFileHandle);
+    WriteLine("");
+    // The log's last line tells how the run ended; the viewer waits for it.
+    WriteLine(exitCode == 0 ? "Successful completion" : "Abnormal completion");
+    if (gMessages.logUnit > 0) ReleaseUnit(gMessages.logUnit);
+    gKvtAccess.logUnit = -1;
+    SetLogUnit(-1);
+    ProcessFinish();
+    NormalExit(exitCode);
+}
+
+void RunMain(int argc, const char* const* argv) {
+    SetFloatingPointMode();
+    ReadCommandLine(argc, argv);
+
+    InitTiming(gOverallTiming, "Overall", 4);
+    AddTiming(gOverallTiming, kTaskPreProcessing, "Pre-processing");
+    AddTiming(gOverallTiming, kTaskCalculation, "Calculation");
+    AddTiming(gOverallTiming, kTaskPostProcessing, "Post-processing");
+    AddTiming(gOverallTiming, kTaskTotal, "Total");
+    StartTiming(gOverallTiming, kTaskTotal);
+    StartTiming(gOverallTiming, kTaskPreProcessing);
+
+    ReadModelSetup(gRun.parameterFileHandle, gRun.parameterFileName);
+    SetThreads(gProcess.maxThreads);
+    StopTiming(gOverallTiming, kTaskPreProcessing);
+
+    // The solvers hand back their exit code in gRun.runExitCode; the 2DH time
+    // loop and the mesh solver are called here once they are part of the engine.
+
+    StopTiming(gOverallTiming, kTaskTotal);
+    WriteTimingReport(gOverallTiming);
+    Shutdown(gRun.parameterFileName, gRun.runExitCode);
+}

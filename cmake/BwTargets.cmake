@@ -5,7 +5,7 @@ function(bw_library name dir)
     cmake_parse_arguments(ARG "" "" "EXCLUDE;DEPS" ${ARGN})
     file(GLOB sources CONFIGURE_DEPENDS ${dir}/*.cpp)
     foreach(ex ${ARG_EXCLUDE})
-        list(REMOVE_ITEM sources ${dir}/${ex})
+        list(REMOVE_ITEM sources ${CMAKE_CURRENT_SOURCE_DIR}/${dir}/${ex})
     endforeach()
     if(NOT sources)
         return()  # a folder whose sources are still to come

@@ -72,13 +72,14 @@ void ReadCommandLine(int argc, const char* const* argv) {
     if (fileName.empty()) StopRun(kUsage);
     gRun.parameterFileName = fileName;
 
-    OpenProgressChannel(ChannelName(fileName));
-    ProgressValue(0);
-
     int status = 0;
     gRun.parameterFileHandle = KvtOpenFile(fileName, true, &status);
     if (status != 0) StopRun(std::string(kProgramTitle) + ": Unable to open " + fileName);
     SetLogUnit(gKvtAccess.logUnit);
+    // The channel opens once the file is known to be there, so that a mistyped
+    // name leaves no progress file behind.
+    OpenProgressChannel(ChannelName(fileName));
+    ProgressValue(0);
     if (kvtPeekErrorGlb() == kKvtErrSyntax) StopOnSyntaxError(fileName);
     WriteComputingEnvironment();
 }

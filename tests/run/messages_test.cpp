@@ -67,7 +67,7 @@ TEST(MessageForms, WarningPiecesAndBlockHeadings) {
     WriteBlockHeading("");
     WriteLabelled("Number of threads: %", 2);
     auto lines = log.Lines();
-    ASSERT_EQ(lines.size(), 12u);
+    ASSERT_EQ(lines.size(), 10u);
     EXPECT_EQ(lines[0], "");
     EXPECT_EQ(lines[1], "Warning: " + std::string(61, 'a'));
     EXPECT_EQ(lines[2], "");

@@ -48,7 +48,9 @@ std::vector<std::string> ReadLines(const std::string& path) {
     return lines;
 }
 
-static std::string Slurp(int fd) {
+namespace {
+
+std::string Slurp(int fd) {
     std::string text;
     char buf[4096];
     ssize_t n;
@@ -56,9 +58,9 @@ static std::string Slurp(int fd) {
     return text;
 }
 
-RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cwd,
-                     const std::map<std::string, std::string>& env,
-                     const std::vector<std::string>& unset) {
+RunResult Run(const std::vector<std::string>& argv, const std::string& cwd,
+              const std::map<std::string, std::string>& env, const std::vector<std::string>& unset,
+              const std::string* input) {
     RunResult result;
     // Output goes to files rather than pipes, so that a chatty child never blocks.
     char outName[] = "/tmp/bwtest_outXXXXXX";
@@ -70,8 +72,15 @@ RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cw
         if (!cwd.empty() && chdir(cwd.c_str()) != 0) _exit(127);
         dup2(outFd, 1);
         dup2(errFd, 2);
-        int nullFd = open("/dev/null", O_RDONLY);
-        dup2(nullFd, 0);
+        int inFd = open("/dev/null", O_RDONLY);
+        if (input != nullptr) {
+            char inName[] = "/tmp/bwtest_inXXXXXX";
+            inFd = mkstemp(inName);
+            if (write(inFd, input->data(), input->size()) < 0) _exit(127);
+            lseek(inFd, 0, SEEK_SET);
+            unlink(inName);
+        }
+        dup2(inFd, 0);
         for (const auto& name : unset) unsetenv(name.c_str());
         for (const auto& [name, value] : env) setenv(name.c_str(), value.c_str(), 1);
         std::vector<char*> args;
@@ -95,14 +104,28 @@ RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cw
     return result;
 }
 
+}  // namespace
+
+RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cwd,
+                     const std::map<std::string, std::string>& env,
+                     const std::vector<std::string>& unset) {
+    return Run(argv, cwd, env, unset, nullptr);
+}
+
+RunResult RunProgramWithInput(const std::vector<std::string>& argv, const std::string& cwd,
+                              const std::string& input,
+                              const std::map<std::string, std::string>& env) {
+    return Run(argv, cwd, env, {}, &input);
+}
+
 std::string BuiltProgram(const std::string& name) {
     const char* dir = std::getenv("BW_BINARY_DIR");
     std::string base = dir ? dir : BW_BINARY_DIR_FALLBACK;
     for (const char* sub : {"/src/", "/tools/"}) {
         fs::path p = fs::path(base + sub) / name;
-        if (fs::exists(p)) return p.string();
+        if (fs::is_regular_file(p)) return p.string();
         p = fs::path(base + sub) / name / name;
-        if (fs::exists(p)) return p.string();
+        if (fs::is_regular_file(p)) return p.string();
     }
     return base + "/src/" + name;
 }

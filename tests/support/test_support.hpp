@@ -36,6 +36,11 @@ RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cw
                      const std::map<std::string, std::string>& env = {},
                      const std::vector<std::string>& unset = {});
 
+// The same with the given text on standard input.
+RunResult RunProgramWithInput(const std::vector<std::string>& argv, const std::string& cwd,
+                              const std::string& input,
+                              const std::map<std::string, std::string>& env = {});
+
 // The path of a program built by this project (bw, bwview, bwdata, ...).
 std::string BuiltProgram(const std::string& name);
 

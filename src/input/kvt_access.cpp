@@ -5,7 +5,6 @@
 #include <ctime>
 #include <type_traits>
 
-#include "input/kvt_common.hpp"
 #include "run/messages.hpp"
 #include "run/process.hpp"
 #include "run/units.hpp"
@@ -13,6 +12,16 @@
 KvtAccessState gKvtAccess;
 
 namespace {
+
+enum class KvtKind { Double, Real, Integer, Logical, String, Filename };
+
+struct KvtFetched {
+    double number = 0.0;
+    int32_t integer = 0;
+    bool logical = false;
+    std::string text;
+};
+
 
 void WriteDateAndTime() {
     const std::time_t now = std::time(nullptr);
@@ -29,6 +38,8 @@ std::string Indent(KvtHandle section) {
     const int level = kvtGetLevel(section);
     return std::string(2 * static_cast<size_t>(level + 1), ' ');
 }
+
+void WriteSectionHeading(KvtHandle parent, const std::string& section);
 
 std::string FitWidth(std::string text, int width) {
     if (width > 0) text.resize(static_cast<size_t>(width), ' ');
@@ -111,6 +122,8 @@ KvtHandle KvtOpenSection(KvtHandle parent, std::string_view name, int instance, 
     return handle;
 }
 
+namespace {
+
 void WriteSectionHeading(KvtHandle parent, const std::string& section) {
     if (gKvtAccess.logUnit <= 0) return;
     KvtLogLine("");
@@ -181,67 +194,67 @@ void FinishGetter(std::string& echo, bool present, int code, const std::string& 
     if (status != nullptr) *status = present ? code : 1;
 }
 
-void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance, int param,
-                  int* status) {
+// The course of every getter: look the key up, fetch its parameter, take the
+// value, and echo what was read or the default.
+template <typename T, typename Take, typename ReadText, typename ValueText>
+void GetSetting(KvtHandle section, std::string_view key, T& value, int instance, int param,
+                int* status, KvtKind kind, Take take, ReadText readText, ValueText valueText) {
     KvtFetched f;
     std::string echo;
     bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::Double, f, echo, present);
-    if (present && code == 0) value = f.number;
-    FinishGetter(echo, present, code, NumberText(f.number), NumberText(value), status);
+    const int code = KvtGetKey(section, key, instance, param, kind, f, echo, present);
+    if (present && code == 0) take(f, value);
+    FinishGetter(echo, present, code, readText(f), valueText(value), status);
+}
+
+std::string FetchedNumber(const KvtFetched& f) { return NumberText(f.number); }
+
+}  // namespace
+
+void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance, int param,
+                  int* status) {
+    GetSetting(section, key, value, instance, param, status, KvtKind::Double,
+               [](const KvtFetched& f, double& v) { v = f.number; }, FetchedNumber,
+               [](double v) { return NumberText(v); });
 }
 
 void KvtGetReal(KvtHandle section, std::string_view key, float& value, int instance, int param,
                 int* status) {
-    KvtFetched f;
-    std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::Real, f, echo, present);
-    if (present && code == 0) value = static_cast<float>(f.number);
-    FinishGetter(echo, present, code, NumberText(f.number), NumberText(static_cast<double>(value)),
-                 status);
+    // Read as 64 bits and echoed so; stored as 32 bits.
+    GetSetting(section, key, value, instance, param, status, KvtKind::Real,
+               [](const KvtFetched& f, float& v) { v = static_cast<float>(f.number); },
+               FetchedNumber, [](float v) { return NumberText(static_cast<double>(v)); });
 }
 
 void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance,
                    int param, int* status) {
-    KvtFetched f;
-    std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::Integer, f, echo, present);
-    if (present && code == 0) value = f.integer;
-    FinishGetter(echo, present, code, std::to_string(f.integer), std::to_string(value), status);
+    GetSetting(section, key, value, instance, param, status, KvtKind::Integer,
+               [](const KvtFetched& f, int32_t& v) { v = f.integer; },
+               [](const KvtFetched& f) { return std::to_string(f.integer); },
+               [](int32_t v) { return std::to_string(v); });
 }
 
 void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int instance, int param,
                    int* status) {
-    KvtFetched f;
-    std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::Logical, f, echo, present);
-    if (present && code == 0) value = f.logical;
-    FinishGetter(echo, present, code, LogicalText(f.logical), LogicalText(value), status);
+    GetSetting(section, key, value, instance, param, status, KvtKind::Logical,
+               [](const KvtFetched& f, bool& v) { v = f.logical; },
+               [](const KvtFetched& f) { return LogicalText(f.logical); }, LogicalText);
 }
 
 void KvtGetString(KvtHandle section, std::string_view key, std::string& value, int width,
                   int instance, int param, int* status) {
-    KvtFetched f;
-    std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::String, f, echo, present);
-    if (present && code == 0) value = FitWidth(f.text, width);
-    FinishGetter(echo, present, code, std::string(TrimRight(f.text)),
-                 std::string(TrimRight(value)), status);
+    GetSetting(section, key, value, instance, param, status, KvtKind::String,
+               [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
+               [](const KvtFetched& f) { return std::string(TrimRight(f.text)); },
+               [](const std::string& v) { return std::string(TrimRight(v)); });
 }
 
 void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width,
                     int instance, int param, int* status) {
-    KvtFetched f;
-    std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, KvtKind::Filename, f, echo, present);
-    if (present && code == 0) value = FitWidth(f.text, width);
-    FinishGetter(echo, present, code, PathForEcho(std::string(TrimRight(f.text))),
-                 std::string(TrimRight(value)), status);
+    GetSetting(section, key, value, instance, param, status, KvtKind::Filename,
+               [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
+               [](const KvtFetched& f) { return PathForEcho(std::string(TrimRight(f.text))); },
+               [](const std::string& v) { return std::string(TrimRight(v)); });
 }
 
 namespace {

@@ -2,7 +2,6 @@
 
 #include <cstdlib>
 
-#include "input/kvt_common.hpp"
 #include "run/messages.hpp"
 
 void KvtUseFile(KvtHandle file) {

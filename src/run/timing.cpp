@@ -25,6 +25,13 @@ Clocks ReadClocks() { return {CpuSeconds(), UserSeconds(), WallSeconds()}; }
 
 bool ValidTask(const TimingGroup& group, int task) { return task >= 1 && task <= group.taskCount; }
 
+void ReadStart(TimingTask& t) {
+    const Clocks now = ReadClocks();
+    t.cpuStart = now.cpu;
+    t.userStart = now.user;
+    t.wallStart = now.wall;
+}
+
 std::string Column(const char* format, double value, int width) {
     char buf[64];
     std::snprintf(buf, sizeof buf, format, width, value);
@@ -78,21 +85,12 @@ void AddTiming(TimingGroup& group, int task, const std::string& name) {
     if (!ValidTask(group, task) || group.usedCount >= group.taskCount)
         ReportFatal("AddTiming: Wrong timing number");
     group.order[group.usedCount++] = task;
-    TimingTask& t = group.tasks[task - 1];
-    t.name = name;
-    const Clocks now = ReadClocks();
-    t.cpuStart = now.cpu;
-    t.userStart = now.user;
-    t.wallStart = now.wall;
+    group.tasks[task - 1].name = name;
+    ReadStart(group.tasks[task - 1]);
 }
 
 void StartTiming(TimingGroup& group, int task) {
-    if (!ValidTask(group, task)) return;
-    TimingTask& t = group.tasks[task - 1];
-    const Clocks now = ReadClocks();
-    t.cpuStart = now.cpu;
-    t.userStart = now.user;
-    t.wallStart = now.wall;
+    if (ValidTask(group, task)) ReadStart(group.tasks[task - 1]);
 }
 
 void StopTiming(TimingGroup& group, int task) {

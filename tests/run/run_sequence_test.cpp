@@ -62,3 +62,34 @@ TEST(ProcessLayer, FilesCarryTheProcessIdOnlyUnderALauncherWithMore) {
 }
 
 }  // namespace
+
+#include "support/log_capture.hpp"
+
+namespace {
+
+TEST(ProcessLayer, EnvironmentBlockNamesEveryMachineOnProcessZero) {
+    bwtest::LogCapture log;
+    ProcessState saved = gProcess;
+    gProcess.processorName = "node-a";
+    gProcess.processCount = 4;
+    gProcess.processId = 0;
+    gProcess.machineCount = 2;
+    gProcess.machineNames = {"node-a", "node-b"};
+    gProcess.machineProcesses = {3, 1};
+    WriteComputingEnvironment();
+    gProcess.processCount = saved.processCount;
+    gProcess.processId = saved.processId;
+    gProcess.machineCount = saved.machineCount;
+    gProcess.machineNames = saved.machineNames;
+    gProcess.machineProcesses = saved.machineProcesses;
+    gProcess.processorName = saved.processorName;
+    const std::string text = log.Text();
+    EXPECT_NE(text.find("  Number of processes  : 4\n  Local process id     : 0\n"), std::string::npos);
+    EXPECT_NE(text.find("  Number of machines   : 2\n"
+                        "  Machine            #1: node-a (3)\n"
+                        "  Machine            #2: node-b (1)\n"),
+              std::string::npos)
+        << text;
+}
+
+}  // namespace

@@ -221,26 +221,18 @@ const char* kvtGetName(KvtHandle node) {
     return n->name.c_str();
 }
 
-bool kvtIsInt(KvtHandle param) {
+namespace {
+bool IsKind(KvtHandle param, KvtValueKind kind) {
     const KvtNode* p = Param(param);
-    return p != nullptr && p->valueKind == KvtValueKind::Integer;
+    return p != nullptr && p->valueKind == kind;
 }
-bool kvtIsReal(KvtHandle param) {
-    const KvtNode* p = Param(param);
-    return p != nullptr && p->valueKind == KvtValueKind::Real;
-}
-bool kvtIsBool(KvtHandle param) {
-    const KvtNode* p = Param(param);
-    return p != nullptr && p->valueKind == KvtValueKind::Logical;
-}
-bool kvtIsString(KvtHandle param) {
-    const KvtNode* p = Param(param);
-    return p != nullptr && p->valueKind == KvtValueKind::Text;
-}
-bool kvtIsFilename(KvtHandle param) {
-    const KvtNode* p = Param(param);
-    return p != nullptr && p->valueKind == KvtValueKind::Filename;
-}
+}  // namespace
+
+bool kvtIsInt(KvtHandle param) { return IsKind(param, KvtValueKind::Integer); }
+bool kvtIsReal(KvtHandle param) { return IsKind(param, KvtValueKind::Real); }
+bool kvtIsBool(KvtHandle param) { return IsKind(param, KvtValueKind::Logical); }
+bool kvtIsString(KvtHandle param) { return IsKind(param, KvtValueKind::Text); }
+bool kvtIsFilename(KvtHandle param) { return IsKind(param, KvtValueKind::Filename); }
 
 int32_t kvtGetInt(KvtHandle param) {
     const KvtNode* p = Param(param);

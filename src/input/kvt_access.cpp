@@ -22,7 +22,6 @@ struct KvtFetched {
     std::string text;
 };
 
-
 void WriteDateAndTime() {
     const std::time_t now = std::time(nullptr);
     std::tm local{};
@@ -129,8 +128,8 @@ void WriteSectionHeading(KvtHandle parent, const std::string& section) {
     KvtLogLine("");
     KvtLogLine("");
     const int level = parent != 0 ? kvtGetLevel(parent) : 0;
-    std::string heading = std::string(2 * static_cast<size_t>(level > 0 ? level : 0), ' ') +
-                          "Section: " + section;
+    std::string heading =
+        std::string(2 * static_cast<size_t>(level > 0 ? level : 0), ' ') + "Section: " + section;
     if (heading.size() > 128) heading.resize(128);
     heading += ' ';
     if (heading.size() < 70) heading.append(70 - heading.size(), '-');
@@ -145,18 +144,29 @@ int KvtGetParam(KvtHandle keyword, int param, KvtKind kind, KvtFetched& out) {
     const char* text = nullptr;
     switch (kind) {
         case KvtKind::Double:
-        case KvtKind::Real: out.number = kvtGetDouble(p); break;
-        case KvtKind::Integer: out.integer = kvtGetInt(p); break;
+        case KvtKind::Real:
+            out.number = kvtGetDouble(p);
+            break;
+        case KvtKind::Integer:
+            out.integer = kvtGetInt(p);
+            break;
         case KvtKind::Logical:
-            if (kvtIsInt(p)) out.logical = kvtGetInt(p) != 0;
-            else out.logical = kvtGetBool(p);
+            if (kvtIsInt(p))
+                out.logical = kvtGetInt(p) != 0;
+            else
+                out.logical = kvtGetBool(p);
             break;
         case KvtKind::String:
-            if (kvtIsString(p)) text = kvtGetString(p);
-            else if (kvtIsFilename(p)) text = kvtGetFilename(p);
-            else text = kvtGetString(p);  // sets the wrong-kind code
+            if (kvtIsString(p))
+                text = kvtGetString(p);
+            else if (kvtIsFilename(p))
+                text = kvtGetFilename(p);
+            else
+                text = kvtGetString(p);  // sets the wrong-kind code
             break;
-        case KvtKind::Filename: text = kvtGetResultFilenamePath(p); break;
+        case KvtKind::Filename:
+            text = kvtGetResultFilenamePath(p);
+            break;
     }
     code = kvtPeekErrorGlb();
     if (code == 0 && (kind == KvtKind::String || kind == KvtKind::Filename)) {
@@ -176,7 +186,9 @@ int KvtGetKey(KvtHandle section, std::string_view key, int instance, int param, 
     return KvtGetParam(keyword, param, kind, out);
 }
 
-std::string LogicalText(bool value) { return value ? "True" : "False"; }
+std::string LogicalText(bool value) {
+    return value ? "True" : "False";
+}
 
 std::string PathForEcho(const std::string& path) {
     const char* noPath = std::getenv("TRNLIB_LOG_NOPATH");
@@ -188,8 +200,10 @@ std::string PathForEcho(const std::string& path) {
 // Ends a getter: the echo line and the status.
 void FinishGetter(std::string& echo, bool present, int code, const std::string& valueText,
                   const std::string& defaultText, int* status) {
-    if (present && code == 0) echo += valueText;
-    else if (!present) echo += defaultText + " (default)";
+    if (present && code == 0)
+        echo += valueText;
+    else if (!present)
+        echo += defaultText + " (default)";
     KvtLogLine(echo);
     if (status != nullptr) *status = present ? code : 1;
 }
@@ -207,54 +221,62 @@ void GetSetting(KvtHandle section, std::string_view key, T& value, int instance,
     FinishGetter(echo, present, code, readText(f), valueText(value), status);
 }
 
-std::string FetchedNumber(const KvtFetched& f) { return NumberText(f.number); }
+std::string FetchedNumber(const KvtFetched& f) {
+    return NumberText(f.number);
+}
 
 }  // namespace
 
 void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance, int param,
                   int* status) {
-    GetSetting(section, key, value, instance, param, status, KvtKind::Double,
-               [](const KvtFetched& f, double& v) { v = f.number; }, FetchedNumber,
-               [](double v) { return NumberText(v); });
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::Double,
+        [](const KvtFetched& f, double& v) { v = f.number; }, FetchedNumber,
+        [](double v) { return NumberText(v); });
 }
 
 void KvtGetReal(KvtHandle section, std::string_view key, float& value, int instance, int param,
                 int* status) {
     // Read as 64 bits and echoed so; stored as 32 bits.
-    GetSetting(section, key, value, instance, param, status, KvtKind::Real,
-               [](const KvtFetched& f, float& v) { v = static_cast<float>(f.number); },
-               FetchedNumber, [](float v) { return NumberText(static_cast<double>(v)); });
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::Real,
+        [](const KvtFetched& f, float& v) { v = static_cast<float>(f.number); }, FetchedNumber,
+        [](float v) { return NumberText(static_cast<double>(v)); });
 }
 
-void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance,
-                   int param, int* status) {
-    GetSetting(section, key, value, instance, param, status, KvtKind::Integer,
-               [](const KvtFetched& f, int32_t& v) { v = f.integer; },
-               [](const KvtFetched& f) { return std::to_string(f.integer); },
-               [](int32_t v) { return std::to_string(v); });
+void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance, int param,
+                   int* status) {
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::Integer,
+        [](const KvtFetched& f, int32_t& v) { v = f.integer; },
+        [](const KvtFetched& f) { return std::to_string(f.integer); },
+        [](int32_t v) { return std::to_string(v); });
 }
 
 void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int instance, int param,
                    int* status) {
-    GetSetting(section, key, value, instance, param, status, KvtKind::Logical,
-               [](const KvtFetched& f, bool& v) { v = f.logical; },
-               [](const KvtFetched& f) { return LogicalText(f.logical); }, LogicalText);
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::Logical,
+        [](const KvtFetched& f, bool& v) { v = f.logical; },
+        [](const KvtFetched& f) { return LogicalText(f.logical); }, LogicalText);
 }
 
 void KvtGetString(KvtHandle section, std::string_view key, std::string& value, int width,
                   int instance, int param, int* status) {
-    GetSetting(section, key, value, instance, param, status, KvtKind::String,
-               [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
-               [](const KvtFetched& f) { return std::string(TrimRight(f.text)); },
-               [](const std::string& v) { return std::string(TrimRight(v)); });
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::String,
+        [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
+        [](const KvtFetched& f) { return std::string(TrimRight(f.text)); },
+        [](const std::string& v) { return std::string(TrimRight(v)); });
 }
 
 void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width,
                     int instance, int param, int* status) {
-    GetSetting(section, key, value, instance, param, status, KvtKind::Filename,
-               [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
-               [](const KvtFetched& f) { return PathForEcho(std::string(TrimRight(f.text))); },
-               [](const std::string& v) { return std::string(TrimRight(v)); });
+    GetSetting(
+        section, key, value, instance, param, status, KvtKind::Filename,
+        [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
+        [](const KvtFetched& f) { return PathForEcho(std::string(TrimRight(f.text))); },
+        [](const std::string& v) { return std::string(TrimRight(v)); });
 }
 
 namespace {
@@ -266,8 +288,10 @@ void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtK
     std::string echo = Indent(section) + name + " : ";
     const KvtHandle keyword = kvtKeywordByNameNum(section, name.c_str(), 1);
     auto text = [](T v) {
-        if constexpr (std::is_same_v<T, double>) return NumberText(v);
-        else return std::to_string(v);
+        if constexpr (std::is_same_v<T, double>)
+            return NumberText(v);
+        else
+            return std::to_string(v);
     };
     if (keyword == 0) {
         for (int i = 0; i < count; ++i) echo += text(values[i]) + " ";
@@ -281,8 +305,10 @@ void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtK
         KvtFetched f;
         code = KvtGetParam(keyword, i + 1, kind, f);
         if (code != 0) continue;
-        if constexpr (std::is_same_v<T, double>) values[i] = f.number;
-        else values[i] = f.integer;
+        if constexpr (std::is_same_v<T, double>)
+            values[i] = f.number;
+        else
+            values[i] = f.integer;
         echo += text(values[i]) + " ";
     }
     KvtLogLine(echo);

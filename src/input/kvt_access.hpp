@@ -18,8 +18,8 @@
 #include "platform/kvt/kvt.hpp"
 
 struct KvtAccessState {
-    int logUnit = -1;        // above 0: the log is open and values are echoed
-    std::string logName;     // the log's path, once opened
+    int logUnit = -1;           // above 0: the log is open and values are echoed
+    std::string logName;        // the log's path, once opened
     KvtHandle currentFile = 0;  // the file and node of the current-section face
     KvtHandle currentNode = 0;
     int targetInstance = 1;  // the instance last given to the current face's KvtOpenTarget

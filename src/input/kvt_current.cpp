@@ -16,7 +16,8 @@ void KvtOpenTarget(std::string_view name, int instance, int* status) {
     const KvtHandle target =
         KvtOpenTarget(gKvtAccess.currentFile, name, gKvtAccess.targetInstance, &found);
     if (found != 0) {
-        if (status == nullptr) StopRun("KVT target: " + std::string(TrimRight(name)) + " not found");
+        if (status == nullptr)
+            StopRun("KVT target: " + std::string(TrimRight(name)) + " not found");
         *status = -1;
         return;
     }
@@ -67,8 +68,8 @@ void KvtGetDouble(std::string_view key, double& value, int instance, int param,
     KvtGetDouble(gKvtAccess.currentNode, key, value, instance, param, status);
 }
 
-void KvtGetReal(std::string_view key, float& value, int instance, int param,
-                const float* fallback, int* status) {
+void KvtGetReal(std::string_view key, float& value, int instance, int param, const float* fallback,
+                int* status) {
     if (fallback != nullptr) value = *fallback;
     KvtGetReal(gKvtAccess.currentNode, key, value, instance, param, status);
 }
@@ -79,8 +80,8 @@ void KvtGetInteger(std::string_view key, int32_t& value, int instance, int param
     KvtGetInteger(gKvtAccess.currentNode, key, value, instance, param, status);
 }
 
-void KvtGetLogical(std::string_view key, bool& value, int instance, int param,
-                   const bool* fallback, int* status) {
+void KvtGetLogical(std::string_view key, bool& value, int instance, int param, const bool* fallback,
+                   int* status) {
     if (fallback != nullptr) value = *fallback;
     KvtGetLogical(gKvtAccess.currentNode, key, value, instance, param, status);
 }

@@ -11,9 +11,9 @@ constexpr const char* kModelTarget = "TARNEL_BOUSSINESQ_WAVE";
 
 // The run-wide settings of the model file's first section.
 struct BasicSettings {
-    int32_t numberOfDimensions = 2;  // 2: the 2DH model; 1: the mesh solver
-    int32_t deleteFemKvtFile = 1;    // read with one dimension only
-    int32_t openLogFileAfterRun = 1; // read and echoed, no further effect
+    int32_t numberOfDimensions = 2;   // 2: the 2DH model; 1: the mesh solver
+    int32_t deleteFemKvtFile = 1;     // read with one dimension only
+    int32_t openLogFileAfterRun = 1;  // read and echoed, no further effect
 };
 extern BasicSettings gBasic;
 

@@ -58,8 +58,8 @@ bool ParseDateTime(const std::string& text, DateTime& date) {
     int fields = std::sscanf(text.c_str(), "%4d-%2d-%2d %2d:%2d:%2d%c", &year, &month, &day, &hour,
                              &minute, &second, &tail);
     if (fields != 6 && fields != 3) return false;
-    if (month < 1 || month > 12 || day < 1 || hour < 0 || hour > 23 || minute < 0 ||
-        minute > 59 || second < 0 || second > 59)
+    if (month < 1 || month > 12 || day < 1 || hour < 0 || hour > 23 || minute < 0 || minute > 59 ||
+        second < 0 || second > 59)
         return false;
     int y, m, d;
     CalendarDate(DayNumber(year, month, day), y, m, d);

@@ -7,8 +7,12 @@
 namespace {
 constexpr unsigned kFlushBits = 0x8040u;  // flush-to-zero (bit 15) and denormals-are-zero (bit 6)
 }
-void SetFloatingPointMode() { _mm_setcsr(_mm_getcsr() | kFlushBits); }
-bool FlushToZeroActive() { return (_mm_getcsr() & kFlushBits) == kFlushBits; }
+void SetFloatingPointMode() {
+    _mm_setcsr(_mm_getcsr() | kFlushBits);
+}
+bool FlushToZeroActive() {
+    return (_mm_getcsr() & kFlushBits) == kFlushBits;
+}
 #elif defined(__aarch64__)
 namespace {
 constexpr uint64_t kFlushBit = 1ull << 24;  // FZ: inputs and results that are denormal become zero
@@ -22,7 +26,9 @@ void SetFloatingPointMode() {
     const uint64_t fpcr = ReadFpcr() | kFlushBit;
     __asm__ __volatile__("msr fpcr, %0" : : "r"(fpcr));
 }
-bool FlushToZeroActive() { return (ReadFpcr() & kFlushBit) != 0; }
+bool FlushToZeroActive() {
+    return (ReadFpcr() & kFlushBit) != 0;
+}
 #else
 #error "flush-to-zero is not known for this processor"
 #endif

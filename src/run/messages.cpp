@@ -17,7 +17,9 @@ constexpr int kMaxCleanups = 16;
 void (*gCleanups[kMaxCleanups])() = {};
 int gCleanupCount = 0;
 
-FILE* LogFile() { return gMessages.logUnit > 0 ? UnitFile(gMessages.logUnit) : nullptr; }
+FILE* LogFile() {
+    return gMessages.logUnit > 0 ? UnitFile(gMessages.logUnit) : nullptr;
+}
 
 // Writes text in pieces of pieceSize characters, the first behind lead, the
 // others behind as many blanks; length / pieceSize + 1 lines in all.
@@ -43,8 +45,10 @@ std::string ProgramTitle() {
 
 void WriteClosingWords(int code) {
     const char* words = code == 0 ? "Successful completion" : "Abnormal completion";
-    if (gMessages.logUnit > 0) WriteLine(words);
-    else if (gMessages.logUnit < 0) std::printf("%s\n", words);  // the log is closed: tell the user
+    if (gMessages.logUnit > 0)
+        WriteLine(words);
+    else if (gMessages.logUnit < 0)
+        std::printf("%s\n", words);  // the log is closed: tell the user
 }
 
 // Fortran-like power of ten in 32-bit reals, as the limits of FormatNumber are kept.
@@ -74,7 +78,9 @@ std::string_view Trim(std::string_view text) {
     return text.substr(begin);
 }
 
-void SetLogUnit(int unit) { gMessages.logUnit = unit; }
+void SetLogUnit(int unit) {
+    gMessages.logUnit = unit;
+}
 
 void WriteLine(std::string_view text) {
     text = TrimRight(text);
@@ -99,14 +105,18 @@ void WriteLogPart(std::string_view text) {
     if (FILE* log = LogFile()) std::fwrite(text.data(), 1, text.size(), log);
 }
 
-void ReportWarning(std::string_view text) { WritePieces(text, "Warning: ", 61); }
+void ReportWarning(std::string_view text) {
+    WritePieces(text, "Warning: ", 61);
+}
 
 void ReportFatal(std::string_view text) {
     WritePieces(text, "Fatal error: ", 57);
     NormalExit(kExitFatal);
 }
 
-void StopRun(std::string_view text) { StopRun(text, kExitFatal); }
+void StopRun(std::string_view text) {
+    StopRun(text, kExitFatal);
+}
 
 void StopRun(std::string_view text, int code) {
     const std::string message(TrimRight(text));
@@ -239,7 +249,9 @@ std::string FormatNumber(int32_t value, int width) {
     return FormatNumber(static_cast<double>(value), width);
 }
 
-std::string NumberText(double value) { return std::string(Trim(FormatNumber(value, 10))); }
+std::string NumberText(double value) {
+    return std::string(Trim(FormatNumber(value, 10)));
+}
 
 // ---- report blocks --------------------------------------------------------
 

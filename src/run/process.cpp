@@ -56,8 +56,8 @@ void GatherMachines() {
         }
     }
     MPI_Request send;
-    CheckMpi(MPI_Isend(gProcess.processorName.data(), length, MPI_CHAR, 0, 17, MPI_COMM_WORLD,
-                       &send));
+    CheckMpi(
+        MPI_Isend(gProcess.processorName.data(), length, MPI_CHAR, 0, 17, MPI_COMM_WORLD, &send));
     if (gProcess.processId == 0) {
         int* status = AllocateMPIStatus(count);
         CheckMpi(MPI_Waitall(count, requests.data(), reinterpret_cast<MPI_Status*>(status)));
@@ -104,8 +104,10 @@ void ProcessStart() {
         gProcess.processorName.assign(name, length);
         CheckMpi(MPI_Comm_rank(MPI_COMM_WORLD, &gProcess.processId));
         CheckMpi(MPI_Comm_size(MPI_COMM_WORLD, &gProcess.processCount));
-        if (gProcess.processCount == 1) gProcess.processId = -1;
-        else GatherMachines();
+        if (gProcess.processCount == 1)
+            gProcess.processId = -1;
+        else
+            GatherMachines();
     }
     if (gProcess.machineNames.empty() && gProcess.processId <= 0) {
         gProcess.machineNames = {gProcess.processorName};
@@ -162,13 +164,16 @@ void WritePerformance() {
 
 int* AllocateMPIStatus(int count) {
     // Five integers a request, or more where this MPI's status record is larger.
-    constexpr size_t kInts = std::max<size_t>(5, (sizeof(MPI_Status) + sizeof(int) - 1) / sizeof(int));
+    constexpr size_t kInts =
+        std::max<size_t>(5, (sizeof(MPI_Status) + sizeof(int) - 1) / sizeof(int));
     int* status = new (std::nothrow) int[kInts * static_cast<size_t>(count > 0 ? count : 1)];
     if (status == nullptr) ReportFatal("AllocateMPIStatus: Can't allocate memory");
     return status;
 }
 
-void DeallocateMPIStatus(int* status) { delete[] status; }
+void DeallocateMPIStatus(int* status) {
+    delete[] status;
+}
 
 std::string ProcessFileStem(std::string_view stem) {
     std::string result(stem);

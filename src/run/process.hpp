@@ -11,7 +11,7 @@
 #include <vector>
 
 struct ProcessState {
-    int processId = -1;       // this process's rank; -1 alone or without message passing
+    int processId = -1;  // this process's rank; -1 alone or without message passing
     int processCount = 1;
     std::string processorName;  // the host's name
     int machineCount = 1;
@@ -20,10 +20,10 @@ struct ProcessState {
     std::vector<std::string> machineNames;
     std::vector<int> processMachine;
     std::vector<int> machineProcesses;
-    int processorCount = 1;   // processors seen by the threads runtime
-    int maxThreads = 1;       // the runtime's maximum of threads
-    int threadCount = 1;      // the number in use
-    bool mpiActive = false;   // message passing was brought up by ProcessStart
+    int processorCount = 1;  // processors seen by the threads runtime
+    int maxThreads = 1;      // the runtime's maximum of threads
+    int threadCount = 1;     // the number in use
+    bool mpiActive = false;  // message passing was brought up by ProcessStart
     omp_lock_t threadLock;
 };
 extern ProcessState gProcess;

@@ -45,16 +45,34 @@ void CutAtLast(std::string& name, const char* part) {
 
 }  // namespace
 
-std::string MessageFileName() { return gProgress.channelBase + "._spi_"; }
-std::string KillFileName() { return gProgress.channelBase + "._kill_"; }
+std::string MessageFileName() {
+    return gProgress.channelBase + "._spi_";
+}
+std::string KillFileName() {
+    return gProgress.channelBase + "._kill_";
+}
 
-void ProgressStatus(std::string_view text) { WriteRecord("STATUS", text); }
-void ProgressStatusLabel(std::string_view text) { WriteRecord("STALBL", text); }
-void ProgressMessage(std::string_view text) { WriteRecord("MESSAG", text); }
-void ProgressMessageLabel(std::string_view text) { WriteRecord("MESLBL", text); }
-void ProgressSpeed(long long pointsPerSecond) { WriteIntegerRecord("COMSPD", pointsPerSecond); }
-void ProgressTimeLeft(long long seconds) { WriteIntegerRecord("TIMLFT", seconds); }
-void ProgressValue(int perMille) { WriteIntegerRecord("PROGRE", perMille); }
+void ProgressStatus(std::string_view text) {
+    WriteRecord("STATUS", text);
+}
+void ProgressStatusLabel(std::string_view text) {
+    WriteRecord("STALBL", text);
+}
+void ProgressMessage(std::string_view text) {
+    WriteRecord("MESSAG", text);
+}
+void ProgressMessageLabel(std::string_view text) {
+    WriteRecord("MESLBL", text);
+}
+void ProgressSpeed(long long pointsPerSecond) {
+    WriteIntegerRecord("COMSPD", pointsPerSecond);
+}
+void ProgressTimeLeft(long long seconds) {
+    WriteIntegerRecord("TIMLFT", seconds);
+}
+void ProgressValue(int perMille) {
+    WriteIntegerRecord("PROGRE", perMille);
+}
 
 void OpenProgressChannel(std::string_view name) {
     gProgress.cancelSeen = false;
@@ -101,8 +119,8 @@ void StartProgress(int firstStep, int lastStep, int& exitCode) {
     ProgressValue(0);
     gProgress.firstStep = firstStep;
     gProgress.lastStep = lastStep;
-    gProgress.factor = lastStep > firstStep ? 1000.0f / static_cast<float>(lastStep - firstStep)
-                                            : 1000.0f;
+    gProgress.factor =
+        lastStep > firstStep ? 1000.0f / static_cast<float>(lastStep - firstStep) : 1000.0f;
     gProgress.lastReport = 0.0;
     gProgress.clockStart = CpuSeconds();
     CheckCancel(exitCode);
@@ -112,10 +130,11 @@ void ReportProgress(int step, long long pointsPerStep, int& exitCode) {
     const double t = CpuSeconds() - gProgress.clockStart;
     if (t - gProgress.lastReport >= gProgress.updateInterval) {
         const int done = step - gProgress.firstStep;
-        ProgressStatus(DateTimeText(AddSeconds(gProgress.simulationStart, done * gProgress.timeStep)));
+        ProgressStatus(
+            DateTimeText(AddSeconds(gProgress.simulationStart, done * gProgress.timeStep)));
         ProgressMessage(Filled("Time step: %", step));
-        ProgressSpeed(t > 0.0 ? static_cast<long long>(done / t * static_cast<double>(pointsPerStep))
-                              : 0);
+        ProgressSpeed(
+            t > 0.0 ? static_cast<long long>(done / t * static_cast<double>(pointsPerStep)) : 0);
         const float value = static_cast<float>(done) * gProgress.factor;
         ProgressValue(value >= 1000.0f ? 1000 : static_cast<int>(value));
         gProgress.lastReport = t;

@@ -14,9 +14,9 @@
 #include "run/datetime.hpp"
 
 struct ProgressState {
-    int progressUnit = -1;     // -1 no channel; 0 standard output; above 0 the message file
-    std::string channelBase;   // stem of both files, empty when none
-    bool cancelSeen = false;   // once true, the kill file is not looked at again
+    int progressUnit = -1;    // -1 no channel; 0 standard output; above 0 the message file
+    std::string channelBase;  // stem of both files, empty when none
+    bool cancelSeen = false;  // once true, the kill file is not looked at again
     // Set by the model setup before the time loop starts.
     DateTime simulationStart;  // date and time of step 0
     double timeStep = 0.0;     // seconds a step
@@ -24,9 +24,9 @@ struct ProgressState {
     // Set by StartProgress.
     int firstStep = 0;
     int lastStep = 0;
-    float factor = 0.0f;       // 1000 / (last - first)
-    double lastReport = 0.0;   // CPU seconds of the loop's clock at the last report
-    double clockStart = 0.0;   // CPU seconds of the process when the loop started
+    float factor = 0.0f;      // 1000 / (last - first)
+    double lastReport = 0.0;  // CPU seconds of the loop's clock at the last report
+    double clockStart = 0.0;  // CPU seconds of the process when the loop started
 };
 extern ProgressState gProgress;
 

@@ -1,7 +1,8 @@
 #include "run/signals.hpp"
 
-#include <csignal>
 #include <ucontext.h>
+
+#include <csignal>
 
 #include "run/messages.hpp"
 
@@ -31,12 +32,18 @@ void OnFloatingPoint(int signal, siginfo_t* info, void* context) {
 
 void OnSignal(int signal) {
     switch (signal) {
-        case SIGABRT: StopRun("Abnormal termination");
-        case SIGILL: StopRun("Illegal instruction");
-        case SIGINT: StopRun("Control-C send");
-        case SIGSEGV: StopRun("Illegal storage access");
-        case SIGTERM: StopRun("Termination request");
-        default: StopRun("Termination request");
+        case SIGABRT:
+            StopRun("Abnormal termination");
+        case SIGILL:
+            StopRun("Illegal instruction");
+        case SIGINT:
+            StopRun("Control-C send");
+        case SIGSEGV:
+            StopRun("Illegal storage access");
+        case SIGTERM:
+            StopRun("Termination request");
+        default:
+            StopRun("Termination request");
     }
 }
 
@@ -44,24 +51,37 @@ void OnSignal(int signal) {
 
 int FpeSubCode(int siCode) {
     switch (siCode) {
-        case FPE_FLTINV: return kFpeInvalid;
-        case FPE_FLTDIV: return kFpeZeroDivide;
-        case FPE_FLTOVF: return kFpeOverflow;
-        case FPE_FLTUND: return kFpeUnderflow;
-        case FPE_FLTRES: return kFpeInexact;
-        default: return kFpeNonIeee;  // integer faults, subscript range, signals sent by hand
+        case FPE_FLTINV:
+            return kFpeInvalid;
+        case FPE_FLTDIV:
+            return kFpeZeroDivide;
+        case FPE_FLTOVF:
+            return kFpeOverflow;
+        case FPE_FLTUND:
+            return kFpeUnderflow;
+        case FPE_FLTRES:
+            return kFpeInexact;
+        default:
+            return kFpeNonIeee;  // integer faults, subscript range, signals sent by hand
     }
 }
 
 std::string FpeText(int subCode) {
     switch (subCode) {
-        case kFpeInvalid: return "Floating point exception: Invalid number";
-        case kFpeDenormal: return "Floating point exception: Denormalized number";
-        case kFpeZeroDivide: return "Floating point exception: Zero divide";
-        case kFpeOverflow: return "Floating point exception: Overflow";
-        case kFpeUnderflow: return "";
-        case kFpeInexact: return "Floating point exception: Inexact precision";
-        default: return "Floating point exception: Non-IEEE type";
+        case kFpeInvalid:
+            return "Floating point exception: Invalid number";
+        case kFpeDenormal:
+            return "Floating point exception: Denormalized number";
+        case kFpeZeroDivide:
+            return "Floating point exception: Zero divide";
+        case kFpeOverflow:
+            return "Floating point exception: Overflow";
+        case kFpeUnderflow:
+            return "";
+        case kFpeInexact:
+            return "Floating point exception: Inexact precision";
+        default:
+            return "Floating point exception: Non-IEEE type";
     }
 }
 
@@ -69,7 +89,8 @@ void InstallSignalHandlers() {
     struct sigaction action = {};
     sigemptyset(&action.sa_mask);
     action.sa_handler = OnSignal;
-    for (int signal : {SIGABRT, SIGILL, SIGINT, SIGSEGV, SIGTERM}) sigaction(signal, &action, nullptr);
+    for (int signal : {SIGABRT, SIGILL, SIGINT, SIGSEGV, SIGTERM})
+        sigaction(signal, &action, nullptr);
 
     struct sigaction fpe = {};
     sigemptyset(&fpe.sa_mask);

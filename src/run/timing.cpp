@@ -21,9 +21,13 @@ struct Clocks {
     double cpu, user, wall;
 };
 
-Clocks ReadClocks() { return {CpuSeconds(), UserSeconds(), WallSeconds()}; }
+Clocks ReadClocks() {
+    return {CpuSeconds(), UserSeconds(), WallSeconds()};
+}
 
-bool ValidTask(const TimingGroup& group, int task) { return task >= 1 && task <= group.taskCount; }
+bool ValidTask(const TimingGroup& group, int task) {
+    return task >= 1 && task <= group.taskCount;
+}
 
 void ReadStart(TimingTask& t) {
     const Clocks now = ReadClocks();
@@ -54,7 +58,8 @@ double UserSeconds() {
 }
 
 double WallFromCount(int64_t count, int64_t rate, int64_t maxCount) {
-    if (count < gLastCount) gWallOffset += static_cast<double>(maxCount) / static_cast<double>(rate);
+    if (count < gLastCount)
+        gWallOffset += static_cast<double>(maxCount) / static_cast<double>(rate);
     gLastCount = count;
     return gWallOffset + static_cast<double>(count) / static_cast<double>(rate);
 }
@@ -140,11 +145,13 @@ void WriteRunStatistics(const TimingGroup& group, int64_t timeSteps, int64_t wat
         const double total = static_cast<double>(computationalPoints);
         if (calc.wallTotal > 0.0) {
             if (calc.cpuTotal > 0.0) {
-                std::snprintf(line, sizeof line, "  CPS (CPU calculation time)            %15.1f [points/sec]",
+                std::snprintf(line, sizeof line,
+                              "  CPS (CPU calculation time)            %15.1f [points/sec]",
                               total / calc.cpuTotal);
                 WriteLine(line);
             }
-            std::snprintf(line, sizeof line, "  CPS (Elapsed calculation time)        %15.1f [points/sec]",
+            std::snprintf(line, sizeof line,
+                          "  CPS (Elapsed calculation time)        %15.1f [points/sec]",
                           total / calc.wallTotal);
             WriteLine(line);
         }

@@ -17,10 +17,10 @@ struct TimingTask {
 
 struct TimingGroup {
     std::string title;
-    int taskCount = 0;             // tasks the group was made for
-    int usedCount = 0;             // tasks added
+    int taskCount = 0;              // tasks the group was made for
+    int usedCount = 0;              // tasks added
     std::vector<TimingTask> tasks;  // taskCount records, task n at index n - 1
-    std::vector<int> order;        // task numbers in the order of adding
+    std::vector<int> order;         // task numbers in the order of adding
 };
 
 // Task numbers of the run's two groups.

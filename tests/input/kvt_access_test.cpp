@@ -1,8 +1,9 @@
+#include "input/kvt_access.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 
-#include "input/kvt_access.hpp"
 #include "input/kvt_current.hpp"
 #include "run/process.hpp"
 #include "run/units.hpp"
@@ -85,7 +86,8 @@ TEST_F(AccessLayer, ValuesDefaultsAndTheirEcho) {
     EXPECT_EQ(log[log.size() - 6], "    Time_step_count : 1000");
     EXPECT_EQ(log[log.size() - 5], "    Time_step_interval : 1");
     EXPECT_EQ(log[log.size() - 4], "    Warm_up_period : 7 (default)");
-    EXPECT_EQ(log[log.size() - 3], "    Precise : 0.123456");  // the value as read, through the formatter
+    EXPECT_EQ(log[log.size() - 3],
+              "    Precise : 0.123456");  // the value as read, through the formatter
     EXPECT_EQ(log[log.size() - 2], "    Start_time : 2004 1 1 0 0 0");
     EXPECT_EQ(log[log.size() - 1], "    Reference : 1.5 2 (default)");
 }
@@ -164,8 +166,7 @@ TEST_F(AccessLayer, SectionInstancesAndMissingSections) {
     EXPECT_EQ(status, -1);
     EXPECT_EQ(KvtOpenTarget(file, "NOT_THERE", 1, &status), 0u);
     EXPECT_EQ(status, -1);
-    EXPECT_EXIT(KvtOpenSection(target, "Porosity"), testing::ExitedWithCode(1),
-                "");
+    EXPECT_EXIT(KvtOpenSection(target, "Porosity"), testing::ExitedWithCode(1), "");
     EXPECT_EXIT(KvtOpenTarget(file, "OTHER"), testing::ExitedWithCode(1), "");
 }
 

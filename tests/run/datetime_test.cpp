@@ -1,6 +1,6 @@
-#include <gtest/gtest.h>
-
 #include "run/datetime.hpp"
+
+#include <gtest/gtest.h>
 
 namespace {
 

@@ -1,8 +1,9 @@
+#include "run/messages.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 
-#include "run/messages.hpp"
 #include "support/log_capture.hpp"
 
 using bwtest::LogCapture;
@@ -23,16 +24,16 @@ TEST(FormatNumber, FixedExponentAndEdgeForms) {
         {12.5, 10, "      12.5"},
         {-0.25, 10, "     -0.25"},
         {0.5, 10, "       0.5"},
-        {0.1234567, 10, "  0.123456"},       // six decimals cut, not rounded
-        {999999999.0, 10, " 999999999"},     // nine digits stay in the fixed form
-        {1e9, 10, "    1.E+09"},             // ten digits take the exponent form
+        {0.1234567, 10, "  0.123456"},    // six decimals cut, not rounded
+        {999999999.0, 10, " 999999999"},  // nine digits stay in the fixed form
+        {1e9, 10, "    1.E+09"},          // ten digits take the exponent form
         {1.23456789e12, 10, "1.2345E+12"},
-        {-1.5e-7, 10, "  -1.5E-07"},          // below 1e-6 at width 10
+        {-1.5e-7, 10, "  -1.5E-07"},  // below 1e-6 at width 10
         {1e-7, 10, "    1.E-07"},
-        {1234.5678912, 10, "1234.56789"},    // longer than the width: cut
-        {1e100, 10, "**********"},           // exponent beyond two digits
+        {1234.5678912, 10, "1234.56789"},  // longer than the width: cut
+        {1e100, 10, "**********"},         // exponent beyond two digits
         {-42.0, 5, "  -42"},
-        {123456.0, 5, "1E+05"},               // one mantissa character is left at width 5
+        {123456.0, 5, "1E+05"},  // one mantissa character is left at width 5
     };
     for (const auto& c : cases) EXPECT_EQ(FormatNumber(c.value, c.width), c.text) << c.value;
 }
@@ -155,7 +156,9 @@ TEST(OrderlyStopDeathTest, ReportFatalUsesTheFatalForm) {
     EXPECT_EQ(lines[3], "Abnormal completion");
 }
 
-void MarkCleanup() { std::fputs("cleanup ran\n", stderr); }
+void MarkCleanup() {
+    std::fputs("cleanup ran\n", stderr);
+}
 
 TEST(OrderlyStopDeathTest, ExitCleanupsRunOnEveryStop) {
     auto stop = [] {

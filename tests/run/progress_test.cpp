@@ -1,9 +1,10 @@
+#include "run/progress.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 #include <filesystem>
 
-#include "run/progress.hpp"
 #include "run/units.hpp"
 #include "support/log_capture.hpp"
 

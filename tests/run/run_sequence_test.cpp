@@ -1,7 +1,8 @@
+#include "run/run_sequence.hpp"
+
 #include <gtest/gtest.h>
 
 #include "run/process.hpp"
-#include "run/run_sequence.hpp"
 
 namespace {
 
@@ -84,7 +85,8 @@ TEST(ProcessLayer, EnvironmentBlockNamesEveryMachineOnProcessZero) {
     gProcess.machineProcesses = saved.machineProcesses;
     gProcess.processorName = saved.processorName;
     const std::string text = log.Text();
-    EXPECT_NE(text.find("  Number of processes  : 4\n  Local process id     : 0\n"), std::string::npos);
+    EXPECT_NE(text.find("  Number of processes  : 4\n  Local process id     : 0\n"),
+              std::string::npos);
     EXPECT_NE(text.find("  Number of machines   : 2\n"
                         "  Machine            #1: node-a (3)\n"
                         "  Machine            #2: node-b (1)\n"),

@@ -1,3 +1,5 @@
+#include "run/signals.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cfenv>
@@ -6,7 +8,6 @@
 
 #include "run/fpmode.hpp"
 #include "run/messages.hpp"
-#include "run/signals.hpp"
 
 namespace {
 

@@ -1,8 +1,9 @@
+#include "run/timing.hpp"
+
 #include <gtest/gtest.h>
 
 #include <thread>
 
-#include "run/timing.hpp"
 #include "support/log_capture.hpp"
 
 namespace {
@@ -33,8 +34,7 @@ TEST(TimingGroupTest, TasksAddUpAndStopTwiceCountsAgain) {
 
 TEST(TimingGroupDeathTest, BadNumbersAreFatal) {
     TimingGroup group;
-    EXPECT_EXIT(InitTiming(group, "x", 0), testing::ExitedWithCode(1),
-                "");
+    EXPECT_EXIT(InitTiming(group, "x", 0), testing::ExitedWithCode(1), "");
     InitTiming(group, "x", 2);
     EXPECT_EXIT(AddTiming(group, 3, "three"), testing::ExitedWithCode(1), "");
 }
@@ -48,7 +48,7 @@ TEST(TimingReport, RowsInTheOrderOfAddingWithTheTotalSetOff) {
     AddTiming(group, 2, "Calculation");
     group.tasks[0].cpuTotal = 1.234;
     group.tasks[0].wallTotal = 12.5;
-    WriteTimingReport(group, 3);  // three of four tasks were added
+    WriteTimingReport(group, 3);       // three of four tasks were added
     WriteTimingReport(TimingGroup{});  // a group with no tasks writes nothing
     auto lines = log.Lines();
     ASSERT_EQ(lines.size(), 12u);
@@ -58,7 +58,8 @@ TEST(TimingReport, RowsInTheOrderOfAddingWithTheTotalSetOff) {
     EXPECT_EQ(lines[4], "  Task" + std::string(30, ' ') + "        CPU time    Elapsed time");
     EXPECT_EQ(lines[6], hyphens);  // before "Total", which was added first
     EXPECT_EQ(lines[7].substr(0, 7), "  Total");
-    EXPECT_EQ(lines[8], "  Pre-processing" + std::string(20, ' ') + "            1.23           12.50");
+    EXPECT_EQ(lines[8],
+              "  Pre-processing" + std::string(20, ' ') + "            1.23           12.50");
     EXPECT_EQ(lines[9].substr(0, 13), "  Calculation");
     EXPECT_EQ(lines[10], hyphens);
     EXPECT_EQ(lines[11], std::string(70, '='));
@@ -73,11 +74,15 @@ TEST(TimingReport, RunStatisticsShowSpeedOnlyWhenTimed) {
     group.tasks[1].wallTotal = 4.0;
     WriteRunStatistics(group, 100, 2500, 250000);
     const std::string text = log.Text();
-    EXPECT_NE(text.find("  Number of water points                           2500\n"), std::string::npos);
-    EXPECT_NE(text.find("  Total number of computational points           250000\n"), std::string::npos);
+    EXPECT_NE(text.find("  Number of water points                           2500\n"),
+              std::string::npos);
+    EXPECT_NE(text.find("  Total number of computational points           250000\n"),
+              std::string::npos);
     // The first block has no speed; the second has both.
-    const std::string cpu = "  CPS (CPU calculation time)            " + std::string(7, ' ') + "125000.0 [points/sec]\n";
-    const std::string wall = "  CPS (Elapsed calculation time)        " + std::string(8, ' ') + "62500.0 [points/sec]\n";
+    const std::string cpu = "  CPS (CPU calculation time)            " + std::string(7, ' ') +
+                            "125000.0 [points/sec]\n";
+    const std::string wall =
+        "  CPS (Elapsed calculation time)        " + std::string(8, ' ') + "62500.0 [points/sec]\n";
     EXPECT_EQ(text.find("CPS"), text.find(cpu) + 2);
     EXPECT_NE(text.find(wall), std::string::npos);
     EXPECT_GT(text.find("CPS"), text.find("Run Statistics", 10));

@@ -91,8 +91,10 @@ RunResult Run(const std::vector<std::string>& argv, const std::string& cwd,
     }
     int status = 0;
     waitpid(pid, &status, 0);
-    if (WIFEXITED(status)) result.exitCode = WEXITSTATUS(status);
-    else if (WIFSIGNALED(status)) result.exitCode = 128 + WTERMSIG(status);
+    if (WIFEXITED(status))
+        result.exitCode = WEXITSTATUS(status);
+    else if (WIFSIGNALED(status))
+        result.exitCode = 128 + WTERMSIG(status);
     lseek(outFd, 0, SEEK_SET);
     lseek(errFd, 0, SEEK_SET);
     result.out = Slurp(outFd);

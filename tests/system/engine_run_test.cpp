@@ -54,11 +54,13 @@ TEST_F(EngineRun, AMissingFileIsNamed) {
 }
 
 TEST_F(EngineRun, ASyntaxErrorGivesItsLineAndColumn) {
-    bwtest::WriteFile(dir / "bad.bw", "TARNEL_BOUSSINESQ_WAVE {\n  BASIC_MODEL_PARAMETERS {\n"
-                                      "    NUMBER_OF_DIMENSIONS 2\n  }\n}\n");
+    bwtest::WriteFile(dir / "bad.bw",
+                      "TARNEL_BOUSSINESQ_WAVE {\n  BASIC_MODEL_PARAMETERS {\n"
+                      "    NUMBER_OF_DIMENSIONS 2\n  }\n}\n");
     RunResult r = Run({"bad.bw"});
     EXPECT_EQ(r.exitCode, 1);
-    EXPECT_TRUE(std::regex_search(r.out, std::regex("^[^\n]+ near line 3 and colum 26 in file bad.bw\n$")))
+    EXPECT_TRUE(
+        std::regex_search(r.out, std::regex("^[^\n]+ near line 3 and colum 26 in file bad.bw\n$")))
         << r.out;
     EXPECT_EQ(LastLine(dir / "bad.log"), "Abnormal completion");
 
@@ -83,7 +85,8 @@ TEST_F(EngineRun, AMinimalModelRunsToSuccessfulCompletion) {
     EXPECT_TRUE(std::regex_match(lines[1], std::regex(" {60}[0-9]{6}")));
     const std::string echo = "\n\n\n" + std::string(70, '=') +
                              "\nTarget: TARNEL_BOUSSINESQ_WAVE\n\n\n\n"
-                             "Section: BASIC_MODEL_PARAMETERS " + std::string(38, '-') +
+                             "Section: BASIC_MODEL_PARAMETERS " +
+                             std::string(38, '-') +
                              "\n    NUMBER_OF_DIMENSIONS : 2 (default)\n"
                              "    OPEN_LOG_FILE_AFTER_RUN : 0\n";
     for (const std::string& expected : std::vector<std::string>{
@@ -119,18 +122,20 @@ TEST_F(EngineRun, UnderALauncherEachProcessWritesItsOwnFiles) {
     bwtest::WriteFile(dir / "basin.bw", kMinimalModel);
     const std::string mpirun = "/usr/bin/mpirun";
     ASSERT_TRUE(fs::exists(mpirun));
-    RunResult r = RunProgram({mpirun, "--oversubscribe", "-n", "2", bw, "basin.bw"}, dir.path.string(),
-                             {{"OMPI_ALLOW_RUN_AS_ROOT", "1"},
-                              {"OMPI_ALLOW_RUN_AS_ROOT_CONFIRM", "1"},
-                              {"OMPI_MCA_btl", "self,vader"}},
-                             {"TARN_PROGRESS"});
+    RunResult r =
+        RunProgram({mpirun, "--oversubscribe", "-n", "2", bw, "basin.bw"}, dir.path.string(),
+                   {{"OMPI_ALLOW_RUN_AS_ROOT", "1"},
+                    {"OMPI_ALLOW_RUN_AS_ROOT_CONFIRM", "1"},
+                    {"OMPI_MCA_btl", "self,vader"}},
+                   {"TARN_PROGRESS"});
     ASSERT_EQ(r.exitCode, 0) << r.out << r.err;
     EXPECT_FALSE(fs::exists(dir / "basin.log"));
     for (int p = 0; p < 2; ++p) {
         const std::string stem = dir / ("basin_p" + std::to_string(p));
         const std::string log = bwtest::ReadFile(stem + ".log");
         EXPECT_NE(log.find("  Number of processes  : 2\n"), std::string::npos);
-        EXPECT_NE(log.find("  Local process id     : " + std::to_string(p) + "\n"), std::string::npos);
+        EXPECT_NE(log.find("  Local process id     : " + std::to_string(p) + "\n"),
+                  std::string::npos);
         EXPECT_EQ(LastLine(stem + ".log"), "Successful completion");
         EXPECT_TRUE(fs::exists(stem + "._spi_"));
     }

@@ -68,14 +68,22 @@ bool ApplyRecord(const std::string& line, ViewState& state) {
     if (line.size() < 6 || (line.size() > 6 && line[6] != ' ')) return false;
     const std::string tag = line.substr(0, 6);
     const std::string value = line.size() > 7 ? TrimRight(line.substr(7)) : "";
-    if (tag == "STATUS") state.status = value;
-    else if (tag == "STALBL") state.statusLabel = value;
-    else if (tag == "MESSAG") state.message = value;
-    else if (tag == "MESLBL") state.messageLabel = value;
-    else if (tag == "COMSPD") state.speed = Integer(value, state.speed);
-    else if (tag == "TIMLFT") state.timeLeft = Integer(value, state.timeLeft);
-    else if (tag == "PROGRE") state.progress = static_cast<int>(Integer(value, state.progress));
-    else return false;
+    if (tag == "STATUS")
+        state.status = value;
+    else if (tag == "STALBL")
+        state.statusLabel = value;
+    else if (tag == "MESSAG")
+        state.message = value;
+    else if (tag == "MESLBL")
+        state.messageLabel = value;
+    else if (tag == "COMSPD")
+        state.speed = Integer(value, state.speed);
+    else if (tag == "TIMLFT")
+        state.timeLeft = Integer(value, state.timeLeft);
+    else if (tag == "PROGRE")
+        state.progress = static_cast<int>(Integer(value, state.progress));
+    else
+        return false;
     ++state.records;
     return true;
 }

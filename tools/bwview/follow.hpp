@@ -9,14 +9,14 @@
 
 // What the viewer knows of the run, from the records read so far.
 struct ViewState {
-    std::string statusLabel;  // STALBL
-    std::string status;       // STATUS: simulation date and time
-    std::string messageLabel; // MESLBL
-    std::string message;      // MESSAG: "Time step: N"
-    long long speed = -1;     // COMSPD: points per CPU second
-    long long timeLeft = -1;  // TIMLFT, when a writer gives it
-    int progress = -1;        // PROGRE: per mille
-    int records = 0;          // records read since the file was (re)created
+    std::string statusLabel;   // STALBL
+    std::string status;        // STATUS: simulation date and time
+    std::string messageLabel;  // MESLBL
+    std::string message;       // MESSAG: "Time step: N"
+    long long speed = -1;      // COMSPD: points per CPU second
+    long long timeLeft = -1;   // TIMLFT, when a writer gives it
+    int progress = -1;         // PROGRE: per mille
+    int records = 0;           // records read since the file was (re)created
 };
 
 // The files of one run.
@@ -28,7 +28,7 @@ struct RunFiles {
     // Reading position in the message file.
     off_t offset = 0;
     ino_t inode = 0;
-    std::string partial;      // a last line not yet ended
+    std::string partial;  // a last line not yet ended
 };
 
 // The files of the run of a model file. Under a launcher with more processes

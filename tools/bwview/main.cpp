@@ -33,7 +33,9 @@ void RestoreTerminal() {
     gRawInput = false;
 }
 
-void OnInterrupt(int) { gInterrupted = 1; }
+void OnInterrupt(int) {
+    gInterrupted = 1;
+}
 
 void OnTerminate(int signal) {
     RestoreTerminal();
@@ -109,10 +111,11 @@ struct Input {
 };
 
 void Usage(FILE* out) {
-    std::fprintf(out,
-                 "Usage: bwview [--interval SECONDS] MODEL.bw\n"
-                 "Follows the run of MODEL.bw through its progress file and cancels it on request.\n"
-                 "Keys: q or Ctrl-C asks whether to cancel the run.\n");
+    std::fprintf(
+        out,
+        "Usage: bwview [--interval SECONDS] MODEL.bw\n"
+        "Follows the run of MODEL.bw through its progress file and cancels it on request.\n"
+        "Keys: q or Ctrl-C asks whether to cancel the run.\n");
 }
 
 }  // namespace
@@ -153,9 +156,9 @@ int main(int argc, char** argv) {
 
     RunFiles run = LocateRun(model);
     // A log that already ends belongs to an earlier run: wait for it to change.
-    struct stat logInfo{};
-    const bool staleLog = ReadRunEnd(run.logFile) != RunEnd::Running &&
-                          stat(run.logFile.c_str(), &logInfo) == 0;
+    struct stat logInfo {};
+    const bool staleLog =
+        ReadRunEnd(run.logFile) != RunEnd::Running && stat(run.logFile.c_str(), &logInfo) == 0;
     const timespec staleTime = logInfo.st_mtim;
 
     ViewState state;
@@ -168,7 +171,7 @@ int main(int argc, char** argv) {
 
         RunEnd end = ReadRunEnd(run.logFile);
         if (end != RunEnd::Running && staleLog) {
-            struct stat now{};
+            struct stat now {};
             stat(run.logFile.c_str(), &now);
             if (now.st_mtim.tv_sec == staleTime.tv_sec && now.st_mtim.tv_nsec == staleTime.tv_nsec)
                 end = RunEnd::Running;
@@ -195,8 +198,8 @@ int main(int argc, char** argv) {
 
         if (end != RunEnd::Running) {
             if (terminalOut) std::printf("\n");
-            std::printf("Run ended: %s\n",
-                        end == RunEnd::Successful ? "Successful completion" : "Abnormal completion");
+            std::printf("Run ended: %s\n", end == RunEnd::Successful ? "Successful completion"
+                                                                     : "Abnormal completion");
             return end == RunEnd::Successful ? 0 : 1;
         }
 

@@ -19,18 +19,24 @@ double EstimateTimeLeft(const ViewState& state, double nowWall, RateTracker& tra
 std::string FormatDuration(double seconds) {
     const long s = static_cast<long>(seconds + 0.5);
     char text[32];
-    if (s < 60) std::snprintf(text, sizeof text, "%lds", s);
-    else if (s < 3600) std::snprintf(text, sizeof text, "%ld:%02ld", s / 60, s % 60);
-    else std::snprintf(text, sizeof text, "%ld:%02ld:%02ld", s / 3600, (s / 60) % 60, s % 60);
+    if (s < 60)
+        std::snprintf(text, sizeof text, "%lds", s);
+    else if (s < 3600)
+        std::snprintf(text, sizeof text, "%ld:%02ld", s / 60, s % 60);
+    else
+        std::snprintf(text, sizeof text, "%ld:%02ld:%02ld", s / 3600, (s / 60) % 60, s % 60);
     return text;
 }
 
 std::string FormatSpeed(long long pointsPerSecond) {
     char text[32];
     const double v = static_cast<double>(pointsPerSecond);
-    if (pointsPerSecond < 10000) std::snprintf(text, sizeof text, "%lld pt/s", pointsPerSecond);
-    else if (pointsPerSecond < 1000000) std::snprintf(text, sizeof text, "%.1f kpt/s", v / 1e3);
-    else std::snprintf(text, sizeof text, "%.2f Mpt/s", v / 1e6);
+    if (pointsPerSecond < 10000)
+        std::snprintf(text, sizeof text, "%lld pt/s", pointsPerSecond);
+    else if (pointsPerSecond < 1000000)
+        std::snprintf(text, sizeof text, "%.1f kpt/s", v / 1e3);
+    else
+        std::snprintf(text, sizeof text, "%.2f Mpt/s", v / 1e6);
     return text;
 }
 

@@ -15,7 +15,7 @@ struct RateTracker {
 // Seconds left, or a negative value while there is no rate yet.
 double EstimateTimeLeft(const ViewState& state, double nowWall, RateTracker& tracker);
 
-std::string FormatDuration(double seconds);  // "42s", "3:07", "1:02:03"
+std::string FormatDuration(double seconds);          // "42s", "3:07", "1:02:03"
 std::string FormatSpeed(long long pointsPerSecond);  // "850 pt/s", "1.25 Mpt/s"
 
 // The line, at most width characters; with bar false no progress bar is drawn.

@@ -4,8 +4,10 @@
 #include <cstdlib>
 
 void hudMessage(const char* text, const char* title, int /*style*/) {
-    if (title != nullptr && title[0] != '\0') std::fprintf(stderr, "%s: %s\n", title, text);
-    else std::fprintf(stderr, "%s\n", text);
+    if (title != nullptr && title[0] != '\0')
+        std::fprintf(stderr, "%s: %s\n", title, text);
+    else
+        std::fprintf(stderr, "%s\n", text);
     std::fflush(stderr);
 }
 

@@ -1,8 +1,8 @@
 // The loader of parameter files: a hand-written recursive reader that builds
 // the tree and stops at the first syntax error with its line and column.
+#include <cctype>
 #include <cerrno>
 #include <cstdlib>
-#include <cctype>
 #include <cstring>
 
 #include "platform/kvt/kvt_store.hpp"
@@ -51,7 +51,9 @@ struct Parser {
         return false;
     }
 
-    static bool IsLetter(char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_'; }
+    static bool IsLetter(char c) {
+        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
+    }
     static bool IsDigit(char c) { return c >= '0' && c <= '9'; }
 
     void SkipBlanks() {
@@ -66,8 +68,10 @@ struct Parser {
         for (;;) {
             SkipBlanks();
             SkipComment();
-            if (cur.Peek() == '\n') cur.Advance();
-            else return;
+            if (cur.Peek() == '\n')
+                cur.Advance();
+            else
+                return;
         }
     }
 
@@ -106,7 +110,8 @@ struct Parser {
         if (cur.Peek() == '+' || cur.Peek() == '-') cur.Advance();
         if (IsLetter(cur.Peek())) {
             std::string word = ReadName();
-            for (char& ch : word) ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
+            for (char& ch : word)
+                ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
             if (word != "inf" && word != "infinity" && word != "nan")
                 return Fail(start, "expected a value");
             p.valueKind = KvtValueKind::Real;
@@ -166,7 +171,8 @@ struct Parser {
         } else if (IsLetter(c)) {
             std::string word = ReadName();
             std::string lower = word;
-            for (char& ch : lower) ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
+            for (char& ch : lower)
+                ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
             if (lower == "true" || lower == "false") {
                 p.valueKind = KvtValueKind::Logical;
                 p.logical = lower == "true";
@@ -174,7 +180,8 @@ struct Parser {
                 p.valueKind = KvtValueKind::Real;
                 p.real = std::strtod(lower.c_str(), nullptr);
             } else {
-                return Fail(start, "expected a value: a number, true, false, \"text\" or file(\"name\")");
+                return Fail(start,
+                            "expected a value: a number, true, false, \"text\" or file(\"name\")");
             }
         } else if (IsDigit(c) || c == '+' || c == '-' || c == '.') {
             if (!ReadNumber(p)) return false;
@@ -252,8 +259,8 @@ struct Parser {
             }
             if (cur.Peek() == '{') {
                 cur.Advance();
-                const int node =
-                    KvtAddNode(tree, parent, top ? KvtNodeKind::Target : KvtNodeKind::Section, name);
+                const int node = KvtAddNode(tree, parent,
+                                            top ? KvtNodeKind::Target : KvtNodeKind::Section, name);
                 if (!ReadBlock(node, at)) return false;
                 continue;
             }

@@ -1,4 +1,6 @@
 // Trees, handles, look-ups and values of the parameter library.
+#include "platform/kvt/kvt_store.hpp"
+
 #include <cmath>
 #include <cstdio>
 #include <cstring>
@@ -7,8 +9,6 @@
 #include <limits>
 #include <memory>
 #include <sstream>
-
-#include "platform/kvt/kvt_store.hpp"
 
 namespace fs = std::filesystem;
 
@@ -25,7 +25,8 @@ int SetError(int code) {
 }
 
 // The node of a handle if it is of one of the kinds asked, else nullptr.
-KvtNode* Node(KvtHandle handle, std::initializer_list<KvtNodeKind> kinds, KvtTree** treeOut = nullptr) {
+KvtNode* Node(KvtHandle handle, std::initializer_list<KvtNodeKind> kinds,
+              KvtTree** treeOut = nullptr) {
     int index = -1;
     KvtTree* tree = KvtFindTree(handle, &index);
     if (tree == nullptr) return nullptr;
@@ -57,7 +58,9 @@ KvtHandle ChildByNameNum(KvtHandle parent, std::initializer_list<KvtNodeKind> pa
     return 0;
 }
 
-KvtNode* Param(KvtHandle handle) { return Node(handle, {KvtNodeKind::Param}); }
+KvtNode* Param(KvtHandle handle) {
+    return Node(handle, {KvtNodeKind::Param});
+}
 
 // Building: the tree of a handle that must be a file handle.
 KvtTree* BuildTree(KvtHandle file) {
@@ -84,7 +87,8 @@ KvtTree* KvtNewTree(const std::string& path) {
     if (!path.empty()) {
         fs::path folder = fs::path(path).parent_path();
         std::error_code ec;
-        tree->folder = fs::absolute(folder.empty() ? fs::path(".") : folder, ec).lexically_normal().string();
+        tree->folder =
+            fs::absolute(folder.empty() ? fs::path(".") : folder, ec).lexically_normal().string();
     }
     tree->nodes.emplace_back();  // the file
     KvtTree* raw = tree.get();
@@ -114,9 +118,9 @@ int KvtAddNode(KvtTree& tree, int parent, KvtNodeKind kind, const std::string& n
     node.parent = parent;
     node.name = name;
     const KvtNode& p = tree.nodes[parent];
-    node.level = (p.kind == KvtNodeKind::File) ? 0
+    node.level = (p.kind == KvtNodeKind::File)    ? 0
                  : (kind == KvtNodeKind::Section) ? p.level + 1
-                                                   : p.level;
+                                                  : p.level;
     tree.nodes.push_back(std::move(node));
     const int index = static_cast<int>(tree.nodes.size()) - 1;
     tree.nodes[parent].children.push_back(index);
@@ -125,7 +129,9 @@ int KvtAddNode(KvtTree& tree, int parent, KvtNodeKind kind, const std::string& n
 
 bool KvtValidName(const std::string& name) {
     if (name.empty()) return false;
-    auto letter = [](char c) { return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_'; };
+    auto letter = [](char c) {
+        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
+    };
     if (!letter(name[0])) return false;
     for (char c : name)
         if (!letter(c) && !(c >= '0' && c <= '9')) return false;
@@ -160,7 +166,9 @@ KvtHandle kvtLoadFile(const char* path, int /*option*/, KvtHandle* file) {
     return kvtLoadText(text.data(), text.size(), path, file);
 }
 
-int kvtPeekErrorGlb() { return gKvtError; }
+int kvtPeekErrorGlb() {
+    return gKvtError;
+}
 
 void kvtGetSyntaxErr(KvtHandle file, int* line, int* column, const char** text) {
     int index = -1;
@@ -205,10 +213,12 @@ int kvtGetLevel(KvtHandle node) {
 
 const char* kvtGetNameGlb(KvtHandle node) {
     KvtTree* tree = nullptr;
-    KvtNode* n = Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword}, &tree);
+    KvtNode* n =
+        Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword}, &tree);
     if (n == nullptr) return nullptr;
     std::string path = n->name;
-    for (int p = n->parent; p > 0; p = tree->nodes[p].parent) path = tree->nodes[p].name + "." + path;
+    for (int p = n->parent; p > 0; p = tree->nodes[p].parent)
+        path = tree->nodes[p].name + "." + path;
     n->globalName = path;
     SetError(kKvtOk);
     return n->globalName.c_str();
@@ -228,17 +238,28 @@ bool IsKind(KvtHandle param, KvtValueKind kind) {
 }
 }  // namespace
 
-bool kvtIsInt(KvtHandle param) { return IsKind(param, KvtValueKind::Integer); }
-bool kvtIsReal(KvtHandle param) { return IsKind(param, KvtValueKind::Real); }
-bool kvtIsBool(KvtHandle param) { return IsKind(param, KvtValueKind::Logical); }
-bool kvtIsString(KvtHandle param) { return IsKind(param, KvtValueKind::Text); }
-bool kvtIsFilename(KvtHandle param) { return IsKind(param, KvtValueKind::Filename); }
+bool kvtIsInt(KvtHandle param) {
+    return IsKind(param, KvtValueKind::Integer);
+}
+bool kvtIsReal(KvtHandle param) {
+    return IsKind(param, KvtValueKind::Real);
+}
+bool kvtIsBool(KvtHandle param) {
+    return IsKind(param, KvtValueKind::Logical);
+}
+bool kvtIsString(KvtHandle param) {
+    return IsKind(param, KvtValueKind::Text);
+}
+bool kvtIsFilename(KvtHandle param) {
+    return IsKind(param, KvtValueKind::Filename);
+}
 
 int32_t kvtGetInt(KvtHandle param) {
     const KvtNode* p = Param(param);
     if (p == nullptr) return 0;
     if (p->valueKind != KvtValueKind::Integer) return SetError(kKvtErrKind), 0;
-    if (p->integer < std::numeric_limits<int32_t>::min() || p->integer > std::numeric_limits<int32_t>::max())
+    if (p->integer < std::numeric_limits<int32_t>::min() ||
+        p->integer > std::numeric_limits<int32_t>::max())
         return SetError(kKvtErrRange), 0;
     SetError(kKvtOk);
     return static_cast<int32_t>(p->integer);
@@ -248,12 +269,15 @@ double kvtGetDouble(KvtHandle param) {
     const KvtNode* p = Param(param);
     if (p == nullptr) return 0.0;
     if (p->valueKind == KvtValueKind::Real) return SetError(kKvtOk), p->real;
-    if (p->valueKind == KvtValueKind::Integer) return SetError(kKvtOk), static_cast<double>(p->integer);
+    if (p->valueKind == KvtValueKind::Integer)
+        return SetError(kKvtOk), static_cast<double>(p->integer);
     SetError(kKvtErrKind);
     return 0.0;
 }
 
-float kvtGetFloat(KvtHandle param) { return static_cast<float>(kvtGetDouble(param)); }
+float kvtGetFloat(KvtHandle param) {
+    return static_cast<float>(kvtGetDouble(param));
+}
 
 bool kvtGetBool(KvtHandle param) {
     const KvtNode* p = Param(param);

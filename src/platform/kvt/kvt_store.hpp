@@ -16,15 +16,15 @@ struct KvtNode {
     KvtNodeKind kind = KvtNodeKind::File;
     int parent = -1;
     int level = 0;
-    std::string name;          // targets, sections and keywords
-    std::vector<int> children; // in file order
+    std::string name;           // targets, sections and keywords
+    std::vector<int> children;  // in file order
     // Parameters.
     KvtValueKind valueKind = KvtValueKind::Integer;
-    bool single = false;       // a real added as 32-bit, written with 9 digits
+    bool single = false;  // a real added as 32-bit, written with 9 digits
     int64_t integer = 0;
     double real = 0.0;
     bool logical = false;
-    std::string text;          // texts and file names as written
+    std::string text;  // texts and file names as written
     // Filled on demand: the path of names and the resolved file path.
     std::string globalName;
     std::string resolved;
@@ -32,7 +32,7 @@ struct KvtNode {
 
 struct KvtTree {
     uint32_t serial = 0;
-    std::string folder;        // the folder of the file, for relative file names
+    std::string folder;          // the folder of the file, for relative file names
     std::vector<KvtNode> nodes;  // node 0 is the file
     std::vector<int> openPath;   // building: the open target and sections
     int lastKeyword = -1;        // building: the keyword that takes parameters

@@ -13,10 +13,13 @@ std::string RealText(double value, bool single) {
     if (std::isnan(value)) return "nan";
     if (std::isinf(value)) return value < 0 ? "-inf" : "inf";
     char buf[40];
-    if (single) std::snprintf(buf, sizeof buf, "%.9g", static_cast<double>(static_cast<float>(value)));
-    else std::snprintf(buf, sizeof buf, "%.17g", value);
+    if (single)
+        std::snprintf(buf, sizeof buf, "%.9g", static_cast<double>(static_cast<float>(value)));
+    else
+        std::snprintf(buf, sizeof buf, "%.17g", value);
     std::string text(buf);
-    if (text.find_first_of(".eE") == std::string::npos) text += ".0";  // stays a real when read back
+    if (text.find_first_of(".eE") == std::string::npos)
+        text += ".0";  // stays a real when read back
     return text;
 }
 
@@ -31,11 +34,16 @@ std::string Quoted(const std::string& text) {
 
 std::string ParamText(const KvtNode& p) {
     switch (p.valueKind) {
-        case KvtValueKind::Integer: return std::to_string(p.integer);
-        case KvtValueKind::Real: return RealText(p.real, p.single);
-        case KvtValueKind::Logical: return p.logical ? "true" : "false";
-        case KvtValueKind::Text: return Quoted(p.text);
-        case KvtValueKind::Filename: return "file(" + Quoted(p.text) + ")";
+        case KvtValueKind::Integer:
+            return std::to_string(p.integer);
+        case KvtValueKind::Real:
+            return RealText(p.real, p.single);
+        case KvtValueKind::Logical:
+            return p.logical ? "true" : "false";
+        case KvtValueKind::Text:
+            return Quoted(p.text);
+        case KvtValueKind::Filename:
+            return "file(" + Quoted(p.text) + ")";
     }
     return "";
 }

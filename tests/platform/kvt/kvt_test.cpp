@@ -1,3 +1,5 @@
+#include "platform/kvt/kvt.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cfloat>
@@ -5,7 +7,6 @@
 #include <cmath>
 #include <filesystem>
 
-#include "platform/kvt/kvt.hpp"
 #include "platform/kvt/kvt_compare.hpp"
 #include "support/test_support.hpp"
 
@@ -46,8 +47,8 @@ TEST(KvtRoundTrip, BuiltTreeWithEveryKindAndExtremeValues) {
     ASSERT_EQ(kvtAddTarget(file, "MeshSolverBW"), kKvtOk);
     ASSERT_EQ(kvtAddSection(file, "MESH_0"), kKvtOk);
     kvtAddKeyword(file, "Doubles");
-    for (double d : {0.1, -0.0, 1e308, DBL_MIN, 4.9e-324, 1.0 / 3.0, 12.0, -1e-17,
-                     HUGE_VAL, -HUGE_VAL, std::nan("")})
+    for (double d : {0.1, -0.0, 1e308, DBL_MIN, 4.9e-324, 1.0 / 3.0, 12.0, -1e-17, HUGE_VAL,
+                     -HUGE_VAL, std::nan("")})
         ASSERT_EQ(kvtAddDouble(file, d), kKvtOk);
     kvtAddKeyword(file, "Floats");
     for (float f : {1.1f, FLT_MAX, FLT_MIN, 3.0f, -0.03f}) kvtAddFloat(file, f);
@@ -74,7 +75,8 @@ TEST(KvtRoundTrip, BuiltTreeWithEveryKindAndExtremeValues) {
     ExpectRoundTrip(file);
 
     // A 32-bit real is written with 9 digits and reads back to the same float.
-    const KvtHandle mesh = kvtSectionByNameNum(kvtTargetByNameNum(file, "MeshSolverBW", 1), "MESH_0", 1);
+    const KvtHandle mesh =
+        kvtSectionByNameNum(kvtTargetByNameNum(file, "MeshSolverBW", 1), "MESH_0", 1);
     EXPECT_EQ(kvtGetFloat(Param(mesh, "Floats", 1)), 1.1f);
     kvtClose(&file);
 }
@@ -122,7 +124,8 @@ TEST(KvtSyntax, EveryErrorWithItsLineAndColumn) {
         {"T {\n  k = 1.5e\n}\n", 2, 7, "malformed number"},
         {"T {\n  k = 99999999999999999999\n}\n", 2, 7, "integer out of range"},
         {"T {\n  k = file(\"a\"\n}\n", 2, 15, "expected ')' after the file name"},
-        {"T {\n  k = \"é\" x\n}\n", 2, 11, "expected ',' or the end of the line"},  // columns count characters
+        {"T {\n  k = \"é\" x\n}\n", 2, 11,
+         "expected ',' or the end of the line"},  // columns count characters
         {"T {\n  lonely\n  k = 1\n}\n", 2, 9, "expected '=' or '{' after a name"},
     };
     for (const auto& c : cases) {
@@ -133,13 +136,15 @@ TEST(KvtSyntax, EveryErrorWithItsLineAndColumn) {
         kvtGetSyntaxErr(file, &line, &column, &message);
         EXPECT_EQ(line, c.line) << c.text;
         EXPECT_EQ(column, c.column) << c.text;
-        EXPECT_NE(std::string(message).find(c.message), std::string::npos) << c.text << " -> " << message;
+        EXPECT_NE(std::string(message).find(c.message), std::string::npos)
+            << c.text << " -> " << message;
         kvtClose(&file);
     }
 }
 
 TEST(KvtLookups, InstancesLevelsAndNames) {
-    KvtHandle file = Load("T {\n A {\n  k = 1\n  k = 2\n  B { x = 1 }\n }\n A { k = 3 }\n}\nT { }\n");
+    KvtHandle file =
+        Load("T {\n A {\n  k = 1\n  k = 2\n  B { x = 1 }\n }\n A { k = 3 }\n}\nT { }\n");
     const KvtHandle t = kvtTargetByNameNum(file, "T", 1);
     EXPECT_NE(kvtTargetByNameNum(file, "T", 2), 0u);
     EXPECT_EQ(kvtTargetByNameNum(file, "T", 3), 0u);
@@ -159,8 +164,10 @@ TEST(KvtLookups, InstancesLevelsAndNames) {
 }
 
 TEST(KvtValues, KindsConversionsAndTheErrorCode) {
-    KvtHandle file = Load("T {\n i = 7, 3000000000\n r = 2.5\n b = true\n s = \"x\"\n f = file(\"d/b.nc\")\n a = file(\"/abs/c.nc\")\n}\n",
-                          "/models/run/model.bw");
+    KvtHandle file = Load(
+        "T {\n i = 7, 3000000000\n r = 2.5\n b = true\n s = \"x\"\n f = file(\"d/b.nc\")\n a = "
+        "file(\"/abs/c.nc\")\n}\n",
+        "/models/run/model.bw");
     const KvtHandle t = kvtTargetByNameNum(file, "T", 1);
     EXPECT_EQ(kvtGetDouble(Param(t, "i")), 7.0);  // an integer may be read as a real
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtOk);
@@ -179,7 +186,8 @@ TEST(KvtValues, KindsConversionsAndTheErrorCode) {
     EXPECT_STREQ(kvtGetFilename(Param(t, "f")), "d/b.nc");
     EXPECT_STREQ(kvtGetResultFilenamePath(Param(t, "f")), "/models/run/d/b.nc");
     EXPECT_STREQ(kvtGetResultFilenamePath(Param(t, "a")), "/abs/c.nc");
-    EXPECT_STREQ(kvtGetResultFilenamePath(Param(t, "s")), "/models/run/x");  // a text as a file name
+    EXPECT_STREQ(kvtGetResultFilenamePath(Param(t, "s")),
+                 "/models/run/x");  // a text as a file name
     EXPECT_TRUE(kvtIsFilename(Param(t, "f")));
     EXPECT_TRUE(kvtIsString(Param(t, "s")));
     EXPECT_TRUE(kvtIsInt(Param(t, "i")));

@@ -72,10 +72,12 @@ TEST(ViewerRender, LineFitsTheWidthAndEstimatesTimeLeft) {
     state.message = "Time step: 1200";
     state.speed = 2500000;
     const std::string line = RenderLine(state, 125.0, 100, true);
-    EXPECT_EQ(line, "[###############---------------]  50.0%  2004-01-01 01:00:00  step 1200  "
-                    "2.50 Mpt/s  left 2:05");
+    EXPECT_EQ(line,
+              "[###############---------------]  50.0%  2004-01-01 01:00:00  step 1200  "
+              "2.50 Mpt/s  left 2:05");
     EXPECT_EQ(RenderLine(state, 125.0, 40, true).size(), 40u);
-    EXPECT_EQ(RenderLine(state, -1.0, 0, false), " 50.0%  2004-01-01 01:00:00  step 1200  2.50 Mpt/s");
+    EXPECT_EQ(RenderLine(state, -1.0, 0, false),
+              " 50.0%  2004-01-01 01:00:00  step 1200  2.50 Mpt/s");
 
     RateTracker tracker;
     state.progress = 100;
@@ -93,7 +95,8 @@ TEST(ViewerProgram, FollowsARunToItsEndInPlainLines) {
         bwtest::WriteFile(dir / "bay._spi_", "PROGRE          0\n");
         bwtest::WriteFile(dir / "bay.log", "log of the new run\n");
         std::this_thread::sleep_for(std::chrono::milliseconds(300));
-        Append(dir / "bay._spi_", "STATUS 2004-01-01 00:10:00\nMESSAG Time step: 600\nPROGRE       1000\n");
+        Append(dir / "bay._spi_",
+               "STATUS 2004-01-01 00:10:00\nMESSAG Time step: 600\nPROGRE       1000\n");
         std::this_thread::sleep_for(std::chrono::milliseconds(300));
         Append(dir / "bay.log", "\nSuccessful completion\n");
     });
@@ -115,10 +118,12 @@ TEST(ViewerProgram, CancelCreatesTheKillFile) {
         // The engine's side: once the kill file is there, the run ends.
         for (int i = 0; i < 200 && !fs::exists(dir / "bay._kill_"); ++i)
             std::this_thread::sleep_for(std::chrono::milliseconds(25));
-        bwtest::WriteFile(dir / "bay.log", "Run is cancelled by the user ...\n\nAbnormal completion\n");
+        bwtest::WriteFile(dir / "bay.log",
+                          "Run is cancelled by the user ...\n\nAbnormal completion\n");
     });
     auto r = bwtest::RunProgramWithInput(
-        {bwtest::BuiltProgram("bwview"), "--interval", "0.05", "bay.bw"}, dir.path.string(), "q\ny\n");
+        {bwtest::BuiltProgram("bwview"), "--interval", "0.05", "bay.bw"}, dir.path.string(),
+        "q\ny\n");
     engine.join();
     EXPECT_TRUE(fs::exists(dir / "bay._kill_"));
     EXPECT_EQ(r.exitCode, 1) << r.out;

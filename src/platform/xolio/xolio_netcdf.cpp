@@ -457,12 +457,12 @@ namespace {
 
 // The axes of a variable's spatial dimensions, from the coordinate variables
 // where there are some: origin and spacing, which must be equidistant.
-int ReadAxes(int ncid, int var, bool dynamic, XolItemRec& item) {
+int ReadAxes(int ncid, int var, bool timeFirst, XolItemRec& item) {
     int ndims = 0;
     nc_inq_varndims(ncid, var, &ndims);
     std::vector<int> dims(static_cast<size_t>(ndims));
     nc_inq_vardimid(ncid, var, dims.data());
-    const int first = dynamic ? 1 : 0;
+    const int first = timeFirst ? 1 : 0;
     item.dims = ndims - first;
     if (item.dims > 4) return XolFail(kXolErrFormat, "more than four spatial axes: " + item.name);
     static const int kTypes[] = {kXolAxisNone, kXolAxisEq1, kXolAxisEq2, kXolAxisEq3, kXolAxisEq4};
@@ -585,6 +585,7 @@ int xolFileRead(const std::string& path, XolHandle* header, XolHandle* file) {
         nc_close(ncid);
         return code;
     }
+    if (timeDim < 0) h->steps = 1;
 
     // Items: every variable that is no coordinate and no grid mapping, in file order.
     int nvars = 0;
@@ -603,7 +604,9 @@ int xolFileRead(const std::string& path, XolHandle* header, XolHandle* file) {
             continue;
         std::vector<int> dims(static_cast<size_t>(ndims));
         nc_inq_vardimid(ncid, var, dims.data());
-        const bool isDynamic = ndims > 0 && dims[0] == timeDim;
+        const bool timeFirst = ndims > 0 && dims[0] == timeDim;
+        // A file without time (a map made with another tool) is one step of dynamic items.
+        const bool isDynamic = timeFirst || timeDim < 0;
         XolItemRec item;
         item.varid = var;
         item.name = GetText(ncid, var, "long_name", name);
@@ -613,7 +616,7 @@ int xolFileRead(const std::string& path, XolHandle* header, XolHandle* file) {
             item.unit = unit > 0 ? unit : 0;
         }
         if (!deleteGiven) GetNumber(ncid, var, "_FillValue", h->deleteValue);
-        if (int code = ReadAxes(ncid, var, isDynamic, item)) {
+        if (int code = ReadAxes(ncid, var, timeFirst, item)) {
             nc_close(ncid);
             return code;
         }
@@ -631,6 +634,7 @@ int xolFileRead(const std::string& path, XolHandle* header, XolHandle* file) {
     f->header = h.get();
     f->path = path;
     f->timeVar = timeVar;
+    f->timeless = timeDim < 0;
     *file = XolRegister(f);
     *header = XolRegister(h.release());
     return 0;
@@ -682,7 +686,10 @@ int NextItem(XolHeaderRec* h, XolFileRec* f, double* time, float* values) {
         for (int d = 0; d < item.dims; ++d)
             count[1 + d] = static_cast<size_t>(item.count[item.dims - 1 - d]);
         std::vector<float> data(item.Size());
-        const int status = nc_get_vara_float(f->ncid, item.varid, start, count, data.data());
+        // A file without time has no time index in front.
+        const int skip = f->timeless ? 1 : 0;
+        const int status =
+            nc_get_vara_float(f->ncid, item.varid, start + skip, count + skip, data.data());
         if (status != NC_NOERR) return NcFail(kXolErrRead, status, f->path);
         Convert(item, data, false, h->deleteValue);
         std::copy(data.begin(), data.end(), values);

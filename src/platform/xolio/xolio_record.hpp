@@ -72,6 +72,7 @@ struct XolFileRec {
     size_t nextItem = 0;      // the item of the stream that comes next
     size_t step = 0;          // the step it belongs to
     size_t staticCursor = 0;  // the next static item to hand out when reading
+    bool timeless = false;    // a file without a time dimension: one step
 };
 
 // Handle checks: the record of a live handle, or nullptr.

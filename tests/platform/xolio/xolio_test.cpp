@@ -252,21 +252,25 @@ data:
         0);
     XolHandle h = 0, f = 0;
     ASSERT_EQ(xolFileRead(dir / "bay.nc", &h, &f), 0) << xolLastErrorText();
-    EXPECT_EQ(xolGetNoOfItems(h), 0);  // no time axis: the map is a static item
-    EXPECT_EQ(xolGetDeleteValFloat(h), -999.0f);
-    const XolHandle st = xolStaticRead(f);
-    ASSERT_NE(st, 0u);
+    ASSERT_EQ(xolGetNoOfItems(h), 1);  // no time axis: one step of one item
+    const XolHandle item = xolItemD(h, 1);
     int type, unit, dataType, counts[4];
     float origins[4], spacings[4];
     std::string name;
-    xolGetItemInfo(st, &type, &name, &unit, &dataType);
+    xolGetItemInfo(item, &type, &name, &unit, &dataType);
     EXPECT_EQ(type, 999);
     EXPECT_EQ(unit, 1000);
     EXPECT_EQ(name, "depth");
-    xolGetItemAxisEq(st, &unit, counts, origins, spacings);
+    EXPECT_EQ(xolGetDeleteValFloat(h), -999.0f);
+    xolGetItemAxisEq(item, &unit, counts, origins, spacings);
     EXPECT_EQ(counts[0], 3);
     EXPECT_EQ(origins[0], 100.0f);
     EXPECT_EQ(spacings[1], 10.0f);
+    float depth[6];
+    ASSERT_EQ(xolReadItemTimeStep(h, f, nullptr, depth), 0);
+    EXPECT_EQ(depth[2], -3.0f);
+    EXPECT_EQ(depth[5], -999.0f);
+    EXPECT_EQ(xolReadItemTimeStep(h, f, nullptr, depth), kXolErrEnd);
     xolFileClose(f);
     xolHeaderDestroy(h);
 }

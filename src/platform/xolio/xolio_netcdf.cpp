@@ -305,7 +305,7 @@ uint64_t PromisedEnd(const std::string& bytes) {
     uint64_t end = r.pos;
     for (const Var& v : list) {
         const uint64_t last =
-            v.record ? (records == 0 ? v.begin : v.begin + (records - 1) * recordSize + v.size)
+            v.record ? (records == 0 ? 0 : v.begin + (records - 1) * recordSize + v.size)
                      : v.begin + v.size;
         end = std::max(end, last);
     }

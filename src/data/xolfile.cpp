@@ -1,0 +1,544 @@
+#include "data/xolfile.hpp"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+
+#include "platform/qty/qty.hpp"
+#include "run/messages.hpp"
+
+namespace {
+
+std::string Cut(const std::string& text, size_t width) {
+    return text.size() > width ? text.substr(0, width) : text;
+}
+
+std::string UnitText(int32_t unit) {
+    std::string text;
+    qtyGetUnitKey(unit, text);
+    return text;
+}
+
+std::string TypeText(int32_t type) {
+    std::string text;
+    qtyGetItemTypeKey(type, text);
+    return text;
+}
+
+// The base unit of a type: the first of its sequence; an undefined type keeps the unit given.
+bool BaseUnit(int32_t type, int32_t unit, int32_t& base) {
+    std::string text;
+    if (type == 999) {
+        base = unit;
+        return true;
+    }
+    return qtyGetItemUnitSeq(type, 1, base, text);
+}
+
+// A failure: into the status when there is one, else the stop of the run.
+void Fail(XolFile& file, int code, int* status, const std::string& stopText = "") {
+    file.lastError = code;
+    if (status != nullptr) {
+        *status = code;
+        return;
+    }
+    StopRun(stopText.empty() ? "TRNXOL Error: " + XolErrorText(code) : stopText);
+}
+
+void Succeed(int* status) {
+    if (status != nullptr) *status = 0;
+}
+
+// Reads the description of an item: its entry, and its axes, which for the
+// first item set the file's and for all others must equal them exactly.
+int ReadItem(XolFile& f, XolHandle handle, int n, XolItem& item) {
+    const int dim = xolGetItemDim(handle);
+    if (n == 1)
+        f.dimension = dim;
+    else if (dim != f.dimension)
+        return kXolBadItem;
+    std::string name;
+    int type = 0, unit = 0, dataType = 0;
+    if (xolGetItemInfo(handle, &type, &name, &unit, &dataType) != 0 || dataType != 1)
+        return kXolBadItem;
+    item.type = type;
+    item.name = Cut(name, 32);
+    item.unit = unit;
+    item.dataType = dataType;
+    if (!BaseUnit(type, unit, item.baseUnit)) return kXolBadItem;
+    xolSetItemUnitConversion(handle, 3, item.baseUnit);
+    item.typeText = TypeText(type);
+    item.unitText = UnitText(item.baseUnit);
+    const int axisType = xolGetItemAxisType(handle);
+    if (axisType != kXolAxisNone && axisType != kXolAxisEq1 && axisType != kXolAxisEq2 &&
+        axisType != kXolAxisEq3 && axisType != kXolAxisEq4)
+        return kXolBadAxis;
+    int axisUnit = 0, counts[4];
+    float origins[4], spacings[4];
+    if (xolGetItemAxisEq(handle, &axisUnit, counts, origins, spacings) != 0) return kXolBadAxis;
+    for (int d = 0; d < dim && d < 4; ++d) {
+        XolAxis axis;
+        axis.count = counts[d];
+        axis.spacing = spacings[d];
+        axis.origin = origins[d];
+        axis.unit = axisUnit;
+        axis.unitText = UnitText(axisUnit);
+        if (n == 1) {
+            f.axes[d] = axis;
+        } else if (f.axes[d].count != axis.count || f.axes[d].origin != axis.origin ||
+                   f.axes[d].spacing != axis.spacing) {
+            return kXolBadAxis;
+        }
+    }
+    return 0;
+}
+
+int OpenSteps(XolFile& f) {
+    const XolHandle h = f.header;
+    std::string startDate = "1970-01-01", startTime = "00:00:00";
+    int unit = 0, steps = 0, startIndex = 0;
+    double offset = 0.0, step = 0.0;
+    int code = 0;
+    f.timeAxisType = xolGetTimeAxisType(h);
+    if (f.timeAxisType == kXolTimeRelative) {
+        code = xolGetEqTimeAxis(h, &unit, &offset, &step, &steps, &startIndex);
+    } else if (f.timeAxisType == kXolTimeCalendar) {
+        code = xolGetEqCalendarAxis(h, &startDate, &startTime, &unit, &offset, &step, &steps,
+                                    &startIndex);
+        f.startDateTime = startDate + " " + startTime;
+    } else {
+        return kXolBadTimeAxis;
+    }
+    if (code != 0) return kXolBadTimeAxis;
+    f.timeUnit = unit;
+    f.timeUnitText = UnitText(unit);
+    f.startOffset = offset;
+    f.timeStep = step;
+    f.noTimeSteps = steps;
+    return 0;
+}
+
+int OpenItems(XolFile& f) {
+    const XolHandle h = f.header;
+    if (xolGetFileType(h) != 1) return kXolBadFileType;
+    f.title = Cut(xolGetFileTitle(h), 80);
+    f.deleteValue = xolGetDeleteValFloat(h);
+    f.dataType = xolGetDataType(h);
+    f.appTitle = Cut(xolGetAppTitle(h), 40);
+    f.appVersion = xolGetAppVersionNo(h);
+    for (XolHandle block = xolGetCustomBlockRef(h); block != 0;) {
+        int type = 0, count = 0;
+        std::string name;
+        const float* values = nullptr;
+        xolGetCustomBlock(block, &type, &name, &count, &values, &block);
+        if (TrimRight(name) == "TRN_Misc") {
+            for (int i = 0; i < 7 && i < count; ++i) f.misc[i] = values[i];
+            break;
+        }
+    }
+    if (xolGetGeoInfoType(h) == 1)
+        xolGetGeoInfoUTMProj(h, &f.projection, &f.longitude, &f.latitude, &f.orientation);
+    f.noDynamicItems = xolGetNoOfItems(h);
+    if (f.noDynamicItems <= 0) return kXolBadItemNumber;
+    f.dynamicItems.assign(static_cast<size_t>(f.noDynamicItems), XolItem{});
+    if (int code = OpenSteps(f)) return code;
+
+    f.noStaticItems = 0;
+    xolFindBlockStatic(f.file);
+    std::vector<XolHandle> statics;
+    for (XolHandle st; (st = xolStaticRead(f.file)) != 0; ++f.noStaticItems) {
+        statics.push_back(st);
+        xolStaticDestroy(st);
+    }
+    for (int n = 1; n <= f.noDynamicItems; ++n)
+        if (int code = ReadItem(f, xolItemD(h, n), n, f.dynamicItems[static_cast<size_t>(n - 1)]))
+            return code;
+    f.staticItems.assign(static_cast<size_t>(f.noStaticItems), XolItem{});
+    for (int n = 1; n <= f.noStaticItems; ++n)
+        if (int code = ReadItem(f, xolItemS(statics[static_cast<size_t>(n - 1)]), -n,
+                                f.staticItems[static_cast<size_t>(n - 1)]))
+            return code;
+    return 0;
+}
+
+// Defines an item in the header before the file or the static item is written.
+int DefineItem(XolFile& f, XolHandle handle, const XolItem& item) {
+    f.lastError = kXolBadItem;
+    int userUnit = item.unit;
+    if (item.type != 999 && !qtyGetItemUserUnit(item.type, userUnit)) return kXolBadItem;
+    if (xolSetItemInfo(handle, item.type, item.name, userUnit, 1) != 0) return kXolBadItem;
+    if (item.type != 999) xolSetItemUnitConversion(handle, 3, item.unit);
+    const XolAxis* a = f.axes;
+    int code = 0;
+    switch (f.dimension) {
+        case 0:
+            code = xolSetItemAxisEqD0(handle, 1000);
+            break;
+        case 1:
+            code = xolSetItemAxisEqD1(handle, a[0].unit, a[0].count, a[0].origin, a[0].spacing);
+            break;
+        case 2:
+            code = xolSetItemAxisEqD2(handle, a[0].unit, a[0].count, a[1].count, a[0].origin,
+                                      a[1].origin, a[0].spacing, a[1].spacing);
+            break;
+        case 3:
+            code = xolSetItemAxisEqD3(handle, a[0].unit, a[0].count, a[1].count, a[2].count,
+                                      a[0].origin, a[1].origin, a[2].origin, a[0].spacing,
+                                      a[1].spacing, a[2].spacing);
+            break;
+        default:
+            code = 1;
+    }
+    if (code != 0) return kXolBadAxis;
+    f.lastError = 0;
+    return 0;
+}
+
+}  // namespace
+
+std::string XolErrorText(int code) {
+    switch (code) {
+        case 101:
+            return "Unable to open XOL file";
+        case 102:
+            return "Invalid type of XOL file";
+        case 103:
+            return "Invalid item number";
+        case 104:
+            return "Unable to detect number of static items";
+        case 105:
+            return "Invalid item";
+        case 106:
+            return "Invalid spatial axis";
+        case 107:
+            return "Invalid time axis";
+        case 108:
+            return "Unable to add custom block";
+        case 111:
+            return "Unable to allocate memory";
+        case 201:
+            return "Unable to read static item";
+        case 202:
+            return "Unable to read dynamic item";
+        case 203:
+            return "Static read call after dynamic";
+        case 204:
+            return "Unable to skip data";
+        case 205:
+            return "Unable to flush file";
+        case 301:
+            return "Unable to create header";
+        case 302:
+            return "Unable to create file";
+        case 401:
+            return "Unable to write static item";
+        case 402:
+            return "Unable to write dynamic item";
+        case 403:
+            return "Static write call after dynamic";
+        case 501:
+            return "Unable to locate static block";
+        case 502:
+            return "Unable to locate dynamic block";
+        default:
+            return "Unknown error: " + std::to_string(code);
+    }
+}
+
+XolFile XolOpenRead(const std::string& path, int* status) {
+    XolFile f;
+    f.appTitle = Cut(program_invocation_short_name, 40);
+    f.path = path;
+    if (xolFileRead(path, &f.header, &f.file) != 0) {
+        Fail(f, kXolOpenFailed, status, "XOL open error on " + std::string(Trim(path)));
+        return f;
+    }
+    if (int code = OpenItems(f)) {
+        xolFileClose(f.file);
+        xolHeaderDestroy(f.header);
+        f.file = f.header = 0;
+        Fail(f, code, status, XolErrorText(code) + " file: " + std::string(Trim(path)));
+        return f;
+    }
+    f.position = f.noStaticItems > 0 ? -1 : 1;
+    f.mode = 1;
+    Succeed(status);
+    return f;
+}
+
+void XolClose(XolFile& f) {
+    xolFileClose(f.file);
+    if (f.mode == 2) {
+        if (OpenSteps(f) != 0) f.lastError = kXolBadTimeAxis;
+        for (int n = 1; n <= f.noDynamicItems; ++n) {
+            XolItem& item = f.dynamicItems[static_cast<size_t>(n - 1)];
+            long missing = 0;
+            xolGetItemStatsGlobal(xolItemD(f.header, n), &item.minimum, &item.maximum, &missing);
+            item.missing = static_cast<int32_t>(missing);
+        }
+    }
+    xolHeaderDestroy(f.header);
+    f.file = f.header = 0;
+    f.mode = 3;
+}
+
+void XolFlush(XolFile& f, int* status) {
+    if (xolFileFlush(f.file) == 0) {
+        Succeed(status);
+        return;
+    }
+    if (status == nullptr) StopRun("Flush error");
+    *status = -1;
+}
+
+void XolGetTimeAxis(const XolFile& f, double& step, int32_t& steps, std::string* date,
+                    int32_t* timeUnit) {
+    step = f.timeStep;
+    steps = f.noTimeSteps;
+    if (date != nullptr) *date = f.timeAxisType == kXolTimeCalendar ? f.startDateTime : "";
+    if (timeUnit != nullptr) *timeUnit = f.timeUnit;
+}
+
+void XolGetAxis(const XolFile& f, int axis, float& spacing, int32_t& count, float* origin,
+                int32_t* unit, int* status) {
+    if (axis < 1 || axis > f.dimension) {
+        XolFile& writable = const_cast<XolFile&>(f);
+        Fail(writable, kXolBadAxis, status);
+        return;
+    }
+    const XolAxis& a = f.axes[axis - 1];
+    spacing = a.spacing;
+    count = a.count;
+    if (origin != nullptr) *origin = a.origin;
+    if (unit != nullptr) *unit = a.unit;
+    Succeed(status);
+}
+
+void XolReadDynamic(XolFile& f, float* values, int* status) {
+    if (f.position < 1) {
+        if (xolFindBlockDynamic(f.file) != 0) return Fail(f, kXolNoDynamicBlock, status);
+        f.position = 1;
+    }
+    double time = 0.0;
+    if (xolReadItemTimeStep(f.header, f.file, &time, values) != 0)
+        return Fail(f, kXolDynamicRead, status);
+    ++f.position;
+    Succeed(status);
+}
+
+void XolSkipDynamic(XolFile& f, int* status) {
+    if (f.position < 1) {
+        if (xolFindBlockDynamic(f.file) != 0) return Fail(f, kXolNoDynamicBlock, status);
+        f.position = 1;
+    }
+    if (xolSkipItem(f.header, f.file) != 0) return Fail(f, kXolSkip, status);
+    ++f.position;
+    Succeed(status);
+}
+
+void XolReadStatic(XolFile& f, float* values, int* status) {
+    if (f.position >= 0) return Fail(f, kXolStaticAfterDynamic, status);
+    if (f.position == -1 && xolFindBlockStatic(f.file) != 0)
+        return Fail(f, kXolNoStaticBlock, status);
+    const XolHandle st = xolStaticRead(f.file);
+    if (st == 0 || xolStaticGetData(st, values) != 0) return Fail(f, kXolStaticRead, status);
+    --f.position;
+    xolStaticDestroy(st);
+    Succeed(status);
+}
+
+XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimension,
+                        const XolHeaderOptions& options, int* status) {
+    XolFile f;
+    f.appTitle =
+        Cut(options.appTitle.empty() ? program_invocation_short_name : options.appTitle, 40);
+    f.appVersion = options.version;
+    f.title = Cut(title, 80);
+    f.dimension = dimension;
+    f.noDynamicItems = items;
+    f.deleteValue = options.deleteValue;
+    f.dynamicItems.assign(static_cast<size_t>(items > 0 ? items : 0), XolItem{});
+    const int fileType = options.fileTypeFlag ? 4 : 1;
+    if (xolHeaderCreate(fileType, f.title, f.appTitle, f.appVersion, items, 1, &f.header) != 0) {
+        f.dynamicItems.clear();
+        Fail(f, kXolCreateHeader, status);
+        return f;
+    }
+    xolSetDeleteValFloat(f.header, f.deleteValue);
+    Succeed(status);
+    return f;
+}
+
+void XolSetItem(XolFile& f, int32_t n, int32_t type, const std::string& name, int32_t unit,
+                int* status) {
+    if (n < 1 || n > f.noDynamicItems) return Fail(f, kXolBadItemNumber, status);
+    XolItem& item = f.dynamicItems[static_cast<size_t>(n - 1)];
+    item.type = type;
+    item.name = Cut(name, 32);
+    item.unit = unit;
+    if (!BaseUnit(type, unit, item.baseUnit)) item.baseUnit = unit;
+    item.typeText = TypeText(type);
+    item.unitText = UnitText(item.baseUnit);
+    Succeed(status);
+}
+
+void XolSetCalendarAxis(XolFile& f, double step, const std::string& start, int32_t timeUnit) {
+    const std::string text = start + std::string(19, ' ');
+    f.timeAxisType = kXolTimeCalendar;
+    f.startDateTime = Cut(start, 32);
+    f.timeStep = step;
+    f.timeUnit = timeUnit;
+    f.timeUnitText = UnitText(timeUnit);
+    xolSetEqCalendarAxis(f.header, text.substr(0, 10), text.substr(11, 8), timeUnit, 0.0, step, 0);
+}
+
+void XolSetAxis(XolFile& f, int axis, float spacing, float origin, int32_t count, int32_t unit) {
+    if (axis < 1 || axis > 4) return;
+    XolAxis& a = f.axes[axis - 1];
+    a.spacing = spacing;
+    a.origin = origin;
+    a.count = count;
+    a.unit = unit;
+    a.unitText = UnitText(unit);
+}
+
+void XolSetProjection(XolFile& f, const std::string& projection, double longitude, double latitude,
+                      double orientation) {
+    f.projection = Cut(projection, 1024);
+    f.longitude = longitude;
+    f.latitude = latitude;
+    f.orientation = orientation;
+    xolSetGeoInfoUTMProj(f.header, f.projection, longitude, latitude, orientation);
+}
+
+void XolSetDataType(XolFile& f, int32_t value) {
+    f.dataType = value;
+    xolSetDataType(f.header, value);
+}
+
+void XolSetMisc(XolFile& f, int index, float value) {
+    if (index >= 1 && index <= 7) f.misc[index - 1] = value;
+}
+
+void XolCreateFile(XolFile& f, const std::string& path, int* status) {
+    f.path = path;
+    if (xolAddCustomBlock(f.header, 1, "TRN_Misc", 7, f.misc) != 0)
+        return Fail(f, kXolNoCustomBlock, status);
+    for (int n = 1; n <= f.noDynamicItems; ++n) {
+        const int code =
+            DefineItem(f, xolItemD(f.header, n), f.dynamicItems[static_cast<size_t>(n - 1)]);
+        if (code != 0) return Fail(f, code, status, XolErrorText(code) + " for " + path);
+    }
+    if (xolFileCreate(path, f.header, &f.file) != 0)
+        return Fail(f, kXolCreateFile, status, XolErrorText(kXolCreateFile) + " for " + path);
+    f.position = 0;
+    f.mode = 2;
+    Succeed(status);
+}
+
+void XolWriteStatic(XolFile& f, const float* values, int32_t type, const std::string& name,
+                    int32_t unit, int* status) {
+    if (f.position >= 1) return Fail(f, kXolStaticWriteAfterDynamic, status);
+    const XolHandle st = xolStaticCreate(f.header);
+    XolItem item;
+    item.type = type;
+    item.name = Cut(name, 32);
+    item.unit = unit;
+    if (!BaseUnit(type, unit, item.baseUnit)) item.baseUnit = unit;
+    item.typeText = TypeText(type);
+    item.unitText = UnitText(item.baseUnit);
+    f.staticItems.push_back(item);
+    f.noStaticItems = static_cast<int32_t>(f.staticItems.size());
+    if (int code = DefineItem(f, xolItemS(st), item)) return Fail(f, code, status);
+    const int written = xolStaticWrite(f.file, st, values);
+    xolStaticDestroy(st);
+    if (written != 0) return Fail(f, kXolStaticWrite, status);
+    Succeed(status);
+}
+
+void XolWriteDynamic(XolFile& f, const float* values, int* status) {
+    if (f.position == 0) f.position = 1;
+    if (xolWriteItemTimeStep(f.header, f.file, 0.0, values) != 0)
+        return Fail(f, kXolDynamicWrite, status);
+    ++f.position;
+    Succeed(status);
+}
+
+// ---- the summary in the log -------------------------------------------------
+
+void XolPrintSummary(const XolFile& f) {
+    auto number = [](double v) { return FormatNumber(v, 10); };
+    auto column = [](long v, int width) {
+        char text[32];
+        std::snprintf(text, sizeof text, "%*ld", width, v);
+        return std::string(text);
+    };
+    WriteLine(std::string(27, '-') + " Data File Summary " + std::string(27, '-'));
+    WriteLine("  Data origin: " + f.appTitle);
+    WriteLine("  Title  : " + std::string(TrimRight(f.title)));
+    WriteLine(Filled("  Delete : %", f.deleteValue));
+    WriteLine("  Axis  Sets   Interval  Axis origin  Unit");
+    if (f.noTimeSteps > 1) {
+        std::string row = "  time" + column(f.noTimeSteps, 6) + " " + number(f.timeStep);
+        if (f.timeAxisType == kXolTimeCalendar)
+            row += " " + std::string(Trim(f.startDateTime));
+        else
+            row += " " + number(f.startOffset) + " " + f.timeUnitText;
+        WriteLine(row);
+    }
+    for (int d = 0; d < f.dimension && d < 4; ++d) {
+        const XolAxis& a = f.axes[d];
+        WriteLine(column(d + 1, 6) + column(a.count, 6) + " " + number(a.spacing) + "   " +
+                  number(a.origin) + "  " + " " + a.unitText);
+    }
+    WriteLine("Item name             Item type               Minimum    Maximum Missing Unit");
+    for (const XolItem& item : f.dynamicItems) {
+        std::string name = Cut(item.name, 20);
+        name.resize(20, ' ');
+        std::string type = Cut(item.typeText, 20);
+        type.resize(20, ' ');
+        WriteLine("  " + name + " " + type + " " + number(item.minimum) + " " +
+                  number(item.maximum) +
+                  column(item.missing == kUnsetInteger ? 0 : item.missing, 8) + " " +
+                  (item.type == 999 ? std::string() : UnitText(item.baseUnit)));
+    }
+    WriteLine(std::string(70, '-'));
+}
+
+// ---- maps on the model's grid --------------------------------------------------
+
+namespace {
+
+void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
+    const bool x = axis == 1;
+    if (f.axes[axis - 1].spacing != spacing)
+        StopRun(x ? "XOL data does not have the correct grid spacing (x-dir.)"
+                  : "XOL data does not have the correct grid spacing (y-dir.)");
+    if (f.axes[axis - 1].count != last + 1)
+        StopRun(x ? "XOL data does not have the correct number of grid points (x.dir.)"
+                  : "XOL data does not have the correct number of grid points (y.dir.)");
+}
+
+void ReadItems(XolFile& f, int32_t item, float* values) {
+    for (int32_t n = 1; n <= item; ++n) XolReadDynamic(f, values);
+    XolClose(f);
+}
+
+}  // namespace
+
+void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
+    XolFile f = XolOpenRead(path);
+    XolPrintSummary(f);
+    if (f.dimension != 1) StopRun("XOL data is not 1D");
+    CheckAxis(f, 1, grid.dx, grid.J);
+    ReadItems(f, item, values);
+}
+
+void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
+    XolFile f = XolOpenRead(path);
+    XolPrintSummary(f);
+    if (f.dimension != 2) StopRun("ERR_XOL_NOT2D");
+    CheckAxis(f, 1, grid.dx, grid.J);
+    CheckAxis(f, 2, grid.dy, grid.K);
+    ReadItems(f, item, values);
+}

@@ -1,0 +1,144 @@
+// The data-file layer of the model: everything the model wants to know of a
+// data file in one plain record, XolFile, filled at open and read from the
+// record afterwards. Files are read item by item and step by step, written
+// likewise, and summarised in the log.
+//
+// A call with a status pointer gives 0 or the code of its failure and
+// returns; without one, a failure stops the run with "TRNXOL Error: " and the
+// text of the code.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "platform/xolio/xolio.hpp"
+
+constexpr int32_t kUnsetInteger = -91863;
+constexpr float kDeleteValue = -1.0e-30f;
+
+struct XolAxis {
+    int32_t count = kUnsetInteger;
+    float spacing = kDeleteValue;
+    float origin = kDeleteValue;
+    int32_t unit = 1000;
+    std::string unitText = "meter";
+};
+
+struct XolItem {
+    int32_t type = 999;
+    std::string name;      // at most 32 characters
+    int32_t unit = 0;      // the unit the caller or the file gave
+    int32_t baseUnit = 0;  // the type's base unit: what reads deliver and writes expect
+    int32_t dataType = 1;
+    double minimum = kDeleteValue, maximum = kDeleteValue;
+    int32_t missing = kUnsetInteger;
+    std::string typeText = "Unknown";
+    std::string unitText = "Unknown";
+};
+
+struct XolFile {
+    std::string appTitle;  // at most 40 characters
+    int32_t appVersion = 0;
+    std::string title;  // at most 80 characters
+    int32_t dimension = 0;
+    int32_t noDynamicItems = 1;
+    int32_t noStaticItems = 0;
+    int32_t dataType = 0;
+    float deleteValue = kDeleteValue;
+    std::vector<XolItem> dynamicItems;  // item n at index n - 1
+    std::vector<XolItem> staticItems;
+    XolAxis axes[4];
+    int32_t timeAxisType = kUnsetInteger;  // 1 relative, 3 calendar
+    int32_t timeUnit = 1400;
+    std::string startDateTime;  // "YYYY-MM-DD hh:mm:ss" on a calendar axis
+    double startOffset = kDeleteValue;
+    double timeStep = 0.0;
+    int32_t noTimeSteps = kUnsetInteger;
+    std::string timeUnitText = "sec";
+    float misc[7] = {kDeleteValue, kDeleteValue, kDeleteValue, kDeleteValue,
+                     kDeleteValue, kDeleteValue, kDeleteValue};
+    double longitude = kDeleteValue, latitude = kDeleteValue, orientation = kDeleteValue;
+    std::string projection;  // at most 1024 characters
+    XolHandle header = 0, file = 0;
+    int32_t position = kUnsetInteger;  // <0 statics ahead; 0 created; >=1 next dynamic item + 1
+    int32_t lastError = 0;
+    int32_t mode = 0;  // 1 reading, 2 writing, 3 closed
+    std::string path;
+};
+
+// Codes of the layer's failures.
+enum XolCode {
+    kXolOpenFailed = 101,
+    kXolBadFileType = 102,
+    kXolBadItemNumber = 103,
+    kXolNoStaticCount = 104,
+    kXolBadItem = 105,
+    kXolBadAxis = 106,
+    kXolBadTimeAxis = 107,
+    kXolNoCustomBlock = 108,
+    kXolNoMemory = 111,
+    kXolStaticRead = 201,
+    kXolDynamicRead = 202,
+    kXolStaticAfterDynamic = 203,
+    kXolSkip = 204,
+    kXolFlush = 205,
+    kXolCreateHeader = 301,
+    kXolCreateFile = 302,
+    kXolStaticWrite = 401,
+    kXolDynamicWrite = 402,
+    kXolStaticWriteAfterDynamic = 403,
+    kXolNoStaticBlock = 501,
+    kXolNoDynamicBlock = 502
+};
+// The text of a code; "Unknown error: N" for any other.
+std::string XolErrorText(int code);
+
+XolFile XolOpenRead(const std::string& path, int* status = nullptr);
+void XolClose(XolFile& file);
+void XolFlush(XolFile& file, int* status = nullptr);
+void XolPrintSummary(const XolFile& file);
+
+void XolGetTimeAxis(const XolFile& file, double& step, int32_t& steps, std::string* date = nullptr,
+                    int32_t* timeUnit = nullptr);
+void XolGetAxis(const XolFile& file, int axis, float& spacing, int32_t& count,
+                float* origin = nullptr, int32_t* unit = nullptr, int* status = nullptr);
+void XolReadDynamic(XolFile& file, float* values, int* status = nullptr);
+void XolSkipDynamic(XolFile& file, int* status = nullptr);
+void XolReadStatic(XolFile& file, float* values, int* status = nullptr);
+
+// Optional arguments of XolCreateHeader.
+struct XolHeaderOptions {
+    float deleteValue = kDeleteValue;
+    bool fileTypeFlag = false;  // file type 4 instead of 1
+    std::string appTitle;       // empty: the program's name
+    int32_t version = 0;
+};
+XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimension,
+                        const XolHeaderOptions& options = {}, int* status = nullptr);
+void XolSetItem(XolFile& file, int32_t item, int32_t type, const std::string& name, int32_t unit,
+                int* status = nullptr);
+// start: "YYYY-MM-DD hh:mm:ss".
+void XolSetCalendarAxis(XolFile& file, double step, const std::string& start,
+                        int32_t timeUnit = 1400);
+void XolSetAxis(XolFile& file, int axis, float spacing, float origin, int32_t count,
+                int32_t unit = 1000);
+void XolSetProjection(XolFile& file, const std::string& projection, double longitude,
+                      double latitude, double orientation = 0.0);
+void XolSetDataType(XolFile& file, int32_t value);
+void XolSetMisc(XolFile& file, int index, float value);
+void XolCreateFile(XolFile& file, const std::string& path, int* status = nullptr);
+void XolWriteStatic(XolFile& file, const float* values, int32_t type = 999,
+                    const std::string& name = "Static item", int32_t unit = 0,
+                    int* status = nullptr);
+void XolWriteDynamic(XolFile& file, const float* values, int* status = nullptr);
+
+// The grid a map must lie on: spacings and highest indices.
+struct GridShape {
+    float dx = 0.0f, dy = 0.0f;
+    int32_t J = 0, K = 0;
+};
+// Reads items 1 to item of a map on the model's grid into values, so that the
+// selected item is what stays; stops the run on another grid.
+void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid);
+void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid);

@@ -1,0 +1,49 @@
+// Map projection of the model grid, on PROJ.
+//
+// Three kinds of coordinates: geographic (longitude, latitude in degrees),
+// projected (easting, northing in metres of a map projection) and model
+// (x, y in metres on the grid, whose origin lies at a given geographic point
+// and whose y axis is turned `orientation` degrees clockwise from projection
+// north). The projection is "UTM-<zone>" (northern hemisphere), any CRS text
+// PROJ accepts ("EPSG:32632", a PROJ string, WKT), or "NON-UTM" / "LONG/LAT":
+// no map projection, where coordinates pass unchanged and the orientation is 0.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+using GeoHandle = uint64_t;
+
+constexpr int kGeoErrProjection = 1;  // the projection text is not understood
+constexpr int kGeoErrHandle = 2;      // not a live frame
+constexpr int kGeoErrTransform = 3;   // a point PROJ could not transform
+
+// True for the two texts that mean "no map projection".
+bool GeoIsNone(const std::string& projection);
+// The text PROJ is given for a projection ("UTM-32" becomes "EPSG:32632").
+std::string GeoCrsText(const std::string& projection);
+
+// Makes a frame; 0 on success.
+int GeoOpen(GeoHandle* frame, const std::string& projection, double longitude, double latitude,
+            double orientation);
+void GeoClose(GeoHandle frame);
+const char* GeoLastError();
+
+int GeoGeo2Proj(GeoHandle frame, double lon, double lat, double& east, double& north);
+int GeoProj2Geo(GeoHandle frame, double east, double north, double& lon, double& lat);
+int GeoXy2Proj(GeoHandle frame, double x, double y, double& east, double& north);
+int GeoProj2Xy(GeoHandle frame, double east, double north, double& x, double& y);
+int GeoXy2Geo(GeoHandle frame, double x, double y, double& lon, double& lat);
+int GeoGeo2Xy(GeoHandle frame, double lon, double lat, double& x, double& y);
+// Degrees clockwise from the grid's y axis to true north at a model point.
+int GeoTrueNorth(GeoHandle frame, double x, double y, double& degrees);
+// Degrees clockwise from the grid's y axis to projection north.
+int GeoProjectionNorth(GeoHandle frame, double& degrees);
+int GeoProjectionString(GeoHandle frame, std::string& text);
+// The CRS's own name ("WGS 84 / UTM zone 32N"), or the text for no projection.
+int GeoProjectionName(GeoHandle frame, std::string& name);
+// The CRS as WKT (empty for no projection), for the grid mapping of data files.
+int GeoCrsWkt(GeoHandle frame, std::string& wkt);
+int GeoOrigin(GeoHandle frame, double& lon, double& lat);
+// True when two projection texts stand for the same CRS.
+bool GeoIdentical(const std::string& a, const std::string& b);

@@ -1,0 +1,146 @@
+// bwdata: makes data files for bw from plain text and gets results out as text.
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "bwdata/bwdata.hpp"
+#include "data/xolfile.hpp"
+#include "run/messages.hpp"
+
+namespace {
+
+const char* kUsage =
+    "Usage:\n"
+    "  bwdata info FILE\n"
+    "  bwdata import-asc GRID.asc -o OUT.xol2 [--projection TEXT] [--origin LON,LAT]\n"
+    "                    [--orientation DEG] [--name TEXT] [--type CODE] [--unit CODE] [--title "
+    "TEXT]\n"
+    "  bwdata import-csv SERIES.csv -o OUT.xol0 --start \"YYYY-MM-DD hh:mm:ss\"\n"
+    "                    [--types C,...] [--units U,...] [--title TEXT]\n"
+    "  bwdata import-csv LINE.csv -o OUT.xol1 --dx DX --start \"...\" [--type C] [--unit U] "
+    "[--name TEXT]\n"
+    "  bwdata export FILE -o OUT.csv|OUT.asc [--item N] [--step N]\n";
+
+int Fail(const std::string& text) {
+    std::fprintf(stderr, "bwdata: %s\n", text.c_str());
+    return 1;
+}
+
+bool Integers(const std::string& text, std::vector<int>& out) {
+    std::istringstream in(text);
+    std::string field;
+    while (std::getline(in, field, ',')) {
+        char* end = nullptr;
+        const long v = std::strtol(field.c_str(), &end, 10);
+        if (end == field.c_str() || *end != '\0') return false;
+        out.push_back(static_cast<int>(v));
+    }
+    return !out.empty();
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    if (argc < 3 || std::strcmp(argv[1], "--help") == 0) {
+        std::fputs(kUsage, argc < 2 ? stderr : stdout);
+        return argc < 3 && !(argc == 2 && std::strcmp(argv[1], "--help") == 0) ? 2 : 0;
+    }
+    const std::string command = argv[1], input = argv[2];
+    std::string output, start, text;
+    AscOptions asc;
+    CsvOptions csv;
+    int item = 1, step = -1;
+    for (int i = 3; i < argc; ++i) {
+        const std::string arg = argv[i];
+        if (i + 1 >= argc) return Fail("option " + arg + " needs a value");
+        const std::string value = argv[++i];
+        std::vector<int> codes;
+        char* end = nullptr;
+        if (arg == "-o")
+            output = value;
+        else if (arg == "--projection")
+            asc.projection = value;
+        else if (arg == "--origin") {
+            if (std::sscanf(value.c_str(), "%lf,%lf", &asc.longitude, &asc.latitude) != 2)
+                return Fail("--origin needs LON,LAT");
+            asc.originGiven = true;
+        } else if (arg == "--orientation")
+            asc.orientation = std::strtod(value.c_str(), &end);
+        else if (arg == "--name")
+            asc.name = csv.name = value;
+        else if (arg == "--title")
+            asc.title = csv.title = value;
+        else if (arg == "--type" || arg == "--types") {
+            if (!Integers(value, codes)) return Fail(arg + " needs integer codes");
+            asc.type = codes[0];
+            csv.types = codes;
+        } else if (arg == "--unit" || arg == "--units") {
+            if (!Integers(value, codes)) return Fail(arg + " needs integer codes");
+            asc.unit = codes[0];
+            csv.units = codes;
+        } else if (arg == "--start")
+            csv.start = value;
+        else if (arg == "--dx") {
+            csv.line = true;
+            csv.dx = std::strtof(value.c_str(), &end);
+            if (end == value.c_str() || csv.dx <= 0.0f)
+                return Fail("--dx needs a positive spacing");
+        } else if (arg == "--item")
+            item = std::atoi(value.c_str());
+        else if (arg == "--step")
+            step = std::atoi(value.c_str());
+        else
+            return Fail("unknown option " + arg);
+    }
+    if (command == "info") {
+        int status = 0;
+        XolFile f = XolOpenRead(input, &status);
+        if (status != 0) return Fail(input + ": " + XolErrorText(status));
+        // The range of every item over all steps, which a file read for a run leaves unknown.
+        std::vector<float> values;
+        for (int s = 0; s < f.noTimeSteps; ++s)
+            for (XolItem& it : f.dynamicItems) {
+                size_t points = 1;
+                for (int d = 0; d < f.dimension; ++d)
+                    points *= static_cast<size_t>(f.axes[d].count);
+                values.resize(points);
+                XolReadDynamic(f, values.data(), &status);
+                if (status != 0) return Fail(input + ": " + XolErrorText(status));
+                if (it.missing == kUnsetInteger) it.missing = 0;
+                for (float v : values) {
+                    if (v == f.deleteValue) {
+                        ++it.missing;
+                    } else if (it.minimum == kDeleteValue && it.maximum == kDeleteValue) {
+                        it.minimum = it.maximum = v;
+                    } else {
+                        it.minimum = std::min<double>(it.minimum, v);
+                        it.maximum = std::max<double>(it.maximum, v);
+                    }
+                }
+            }
+        XolPrintSummary(f);  // no log is open: the summary goes to standard output
+        std::printf("  Projection: %s (longitude %s, latitude %s, orientation %s)\n",
+                    f.projection.empty() ? "none" : f.projection.c_str(),
+                    NumberText(f.longitude).c_str(), NumberText(f.latitude).c_str(),
+                    NumberText(f.orientation).c_str());
+        XolClose(f);
+        return 0;
+    }
+    if (output.empty()) return Fail("-o OUTPUT is missing");
+    if (command == "import-asc")
+        text = ImportAsc(input, output, asc);
+    else if (command == "import-csv") {
+        if (csv.start.empty()) return Fail("--start \"YYYY-MM-DD hh:mm:ss\" is missing");
+        text = ImportCsv(input, output, csv);
+    } else if (command == "export")
+        text = ExportText(input, output, item, step);
+    else
+        return Fail("unknown command " + command + "\n" + kUsage);
+    if (!text.empty()) return Fail(text);
+    std::printf("%s written\n", output.c_str());
+    return 0;
+}

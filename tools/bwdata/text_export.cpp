@@ -1,0 +1,129 @@
+// Data files into plain text: series and lines as CSV, a map at one step as
+// an ESRI ASCII grid or as the columns j,k,value.
+#include <cstdio>
+#include <cstdlib>
+#include <sstream>
+
+#include "bwdata/bwdata.hpp"
+#include "data/xolfile.hpp"
+
+namespace {
+
+std::string Value(float v, float deleteValue) {
+    if (v == deleteValue) return "";
+    // The shortest text that reads back as the same 32-bit value.
+    char text[32];
+    for (int digits = 6; digits <= 9; ++digits) {
+        std::snprintf(text, sizeof text, "%.*g", digits, static_cast<double>(v));
+        if (std::strtof(text, nullptr) == v) break;
+    }
+    return text;
+}
+
+bool EndsWith(const std::string& text, const std::string& end) {
+    return text.size() >= end.size() &&
+           text.compare(text.size() - end.size(), end.size(), end) == 0;
+}
+
+}  // namespace
+
+std::string ExportText(const std::string& input, const std::string& output, int item, int step) {
+    int status = 0;
+    XolFile f = XolOpenRead(input, &status);
+    if (status != 0) return input + ": " + XolErrorText(status);
+    const int items = f.noDynamicItems;
+    const int steps = f.noTimeSteps;
+    const size_t points = [&] {
+        size_t n = 1;
+        for (int d = 0; d < f.dimension; ++d) n *= static_cast<size_t>(f.axes[d].count);
+        return n;
+    }();
+    if (f.dimension > 2) {
+        XolClose(f);
+        return input + ": files of more than two dimensions are not exported";
+    }
+    if (f.dimension > 0 && (item < 1 || item > items)) {
+        XolClose(f);
+        return input + ": there is no item " + std::to_string(item) + " (the file has " +
+               std::to_string(items) + ")";
+    }
+    std::ostringstream out;
+    std::vector<float> values(points);
+    const double seconds = f.timeStep;  // steps are in seconds in the files the engine writes
+    if (f.dimension < 2) {
+        if (!EndsWith(output, ".csv")) {
+            XolClose(f);
+            return output + ": a series or line file is exported as .csv";
+        }
+        out << "time";
+        if (f.dimension == 0) {
+            for (const XolItem& it : f.dynamicItems) out << "," << it.name;
+        } else {
+            for (size_t p = 0; p < points; ++p)
+                out << ","
+                    << Value(f.axes[0].origin + static_cast<float>(p) * f.axes[0].spacing, 1e30f);
+        }
+        out << "\n";
+        for (int s = 0; s < steps; ++s) {
+            out << Value(static_cast<float>(s * seconds), 1e30f);
+            for (int n = 1; n <= items; ++n) {
+                const bool wanted = f.dimension == 0 || n == item;
+                if (!wanted) {
+                    XolSkipDynamic(f, &status);
+                    continue;
+                }
+                XolReadDynamic(f, values.data(), &status);
+                if (status != 0) break;
+                for (size_t p = 0; p < points; ++p) out << "," << Value(values[p], f.deleteValue);
+            }
+            out << "\n";
+        }
+    } else {
+        const int last = step < 0 ? steps - 1 : step;
+        if (last < 0 || last >= steps) {
+            XolClose(f);
+            return input + ": there is no step " + std::to_string(step) + " (the file has " +
+                   std::to_string(steps) + ")";
+        }
+        for (int s = 0; s <= last && status == 0; ++s)
+            for (int n = 1; n <= items && status == 0; ++n) {
+                if (s == last && n == item)
+                    XolReadDynamic(f, values.data(), &status);
+                else
+                    XolSkipDynamic(f, &status);
+            }
+        const int nx = f.axes[0].count, ny = f.axes[1].count;
+        if (EndsWith(output, ".asc")) {
+            if (f.axes[0].spacing != f.axes[1].spacing) {
+                XolClose(f);
+                return input + ": an ASCII grid needs square cells, the file has dx " +
+                       Value(f.axes[0].spacing, 1e30f) + " and dy " +
+                       Value(f.axes[1].spacing, 1e30f);
+            }
+            out << "ncols " << nx << "\nnrows " << ny << "\nxllcenter "
+                << Value(f.axes[0].origin, 1e30f) << "\nyllcenter "
+                << Value(f.axes[1].origin, 1e30f) << "\ncellsize "
+                << Value(f.axes[0].spacing, 1e30f) << "\nNODATA_value -9999\n";
+            for (int k = ny - 1; k >= 0; --k) {  // the northernmost row first
+                for (int j = 0; j < nx; ++j) {
+                    const float v = values[static_cast<size_t>(k) * nx + j];
+                    out << (j ? " " : "") << (v == f.deleteValue ? "-9999" : Value(v, 1e30f));
+                }
+                out << "\n";
+            }
+        } else if (EndsWith(output, ".csv")) {
+            out << "j,k,value\n";
+            for (int k = 0; k < ny; ++k)
+                for (int j = 0; j < nx; ++j)
+                    out << j << "," << k << ","
+                        << Value(values[static_cast<size_t>(k) * nx + j], f.deleteValue) << "\n";
+        } else {
+            XolClose(f);
+            return output + ": a map is exported as .asc or .csv";
+        }
+    }
+    XolClose(f);
+    if (status != 0) return input + ": " + XolErrorText(status);
+    if (!WriteTextFile(output, out.str())) return output + ": can't be written";
+    return "";
+}

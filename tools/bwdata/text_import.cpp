@@ -1,0 +1,276 @@
+// Plain text into data files: ESRI ASCII grids into maps, CSV tables into
+// series and line files. The whole input is read and checked before a file
+// is written, so that bad input leaves nothing behind.
+#include <cerrno>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <sstream>
+
+#include "bwdata/bwdata.hpp"
+#include "data/geoframe.hpp"
+#include "data/xolfile.hpp"
+#include "platform/qty/qty.hpp"
+#include "run/datetime.hpp"
+
+namespace {
+
+bool Number(const std::string& text, double& value) {
+    const char* begin = text.c_str();
+    while (*begin == ' ' || *begin == '\t') ++begin;
+    char* end = nullptr;
+    errno = 0;
+    value = std::strtod(begin, &end);
+    while (end && (*end == ' ' || *end == '\t' || *end == '\r')) ++end;
+    return end != begin && end && *end == '\0' && errno == 0;
+}
+
+std::vector<std::string> Split(const std::string& line, char separator) {
+    std::vector<std::string> fields;
+    std::string field;
+    std::istringstream in(line);
+    while (std::getline(in, field, separator)) fields.push_back(field);
+    if (!line.empty() && line.back() == separator) fields.emplace_back();
+    return fields;
+}
+
+std::string Trimmed(std::string text) {
+    while (!text.empty() && (text.back() == '\r' || text.back() == ' ')) text.pop_back();
+    size_t start = 0;
+    while (start < text.size() && text[start] == ' ') ++start;
+    return text.substr(start);
+}
+
+std::string Where(const std::string& file, int line) {
+    return file + ":" + std::to_string(line) + ": ";
+}
+
+std::string CheckType(int type, int unit, const std::string& file) {
+    std::string text;
+    if (type != 999 && !qtyGetItemTypeKey(type, text))
+        return file + ": unknown item type " + std::to_string(type);
+    if (!qtyGetUnitKey(unit, text)) return file + ": unknown unit " + std::to_string(unit);
+    if (!qtyItemUnitEqv(type, unit))
+        return file + ": unit " + std::to_string(unit) + " does not fit item type " +
+               std::to_string(type);
+    return "";
+}
+
+// Writes a data file under a scratch name and renames it when complete.
+template <typename Fill>
+std::string WriteData(const std::string& output, Fill fill) {
+    const std::string part = output + ".part";
+    int status = 0;
+    std::string error = fill(part, status);
+    if (error.empty() && status != 0) error = output + ": " + XolErrorText(status);
+    if (!error.empty()) {
+        std::remove(part.c_str());
+        return error;
+    }
+    if (std::rename(part.c_str(), output.c_str()) != 0) return output + ": can't be written";
+    return "";
+}
+
+}  // namespace
+
+bool WriteTextFile(const std::string& path, const std::string& text) {
+    const std::string part = path + ".part";
+    {
+        std::ofstream out(part, std::ios::binary);
+        out << text;
+        if (!out) return false;
+    }
+    return std::rename(part.c_str(), path.c_str()) == 0;
+}
+
+std::string ImportAsc(const std::string& input, const std::string& output,
+                      const AscOptions& options) {
+    std::ifstream in(input);
+    if (!in) return input + ": can't be opened";
+    if (std::string e = CheckType(options.type, options.unit, input); !e.empty()) return e;
+    long ncols = -1, nrows = -1;
+    double x0 = 0, y0 = 0, cell = 0, nodata = NAN;
+    bool centre = false, cellGiven = false;
+    std::string line;
+    int lineNo = 0;
+    std::vector<float> rows;
+    while (std::getline(in, line)) {
+        ++lineNo;
+        std::istringstream fields(line);
+        std::string key;
+        if (!(fields >> key)) continue;
+        double value = 0;
+        std::string lower = key;
+        for (char& c : lower) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+        if (std::isalpha(static_cast<unsigned char>(key[0]))) {
+            std::string rest;
+            fields >> rest;
+            if (!Number(rest, value)) return Where(input, lineNo) + "'" + key + "' needs a number";
+            if (lower == "ncols")
+                ncols = std::lround(value);
+            else if (lower == "nrows")
+                nrows = std::lround(value);
+            else if (lower == "xllcorner" || lower == "xllcenter")
+                x0 = value, centre = lower == "xllcenter";
+            else if (lower == "yllcorner" || lower == "yllcenter")
+                y0 = value;
+            else if (lower == "cellsize")
+                cell = value, cellGiven = true;
+            else if (lower == "nodata_value")
+                nodata = value;
+            else
+                return Where(input, lineNo) + "unknown header key '" + key + "'";
+            continue;
+        }
+        if (ncols <= 0 || nrows <= 0 || !cellGiven || cell <= 0)
+            return Where(input, lineNo) + "the header needs ncols, nrows and a positive cellsize";
+        std::istringstream values(line);
+        std::string token;
+        long count = 0;
+        while (values >> token) {
+            if (!Number(token, value))
+                return Where(input, lineNo) + "'" + token + "' is not a number";
+            rows.push_back(value == nodata ? kDeleteValue : static_cast<float>(value));
+            ++count;
+        }
+        if (count != ncols)
+            return Where(input, lineNo) + "a row of " + std::to_string(count) + " values, not " +
+                   std::to_string(ncols);
+    }
+    if (ncols <= 0 || nrows <= 0) return input + ": no grid header";
+    if (static_cast<long>(rows.size()) != ncols * nrows)
+        return input + ": " + std::to_string(rows.size() / ncols) + " rows, not " +
+               std::to_string(nrows);
+
+    // The first row is the northernmost: it becomes the row k = K.
+    std::vector<float> map(rows.size());
+    for (long k = 0; k < nrows; ++k)
+        for (long j = 0; j < ncols; ++j) map[k * ncols + j] = rows[(nrows - 1 - k) * ncols + j];
+
+    double lon = options.longitude, lat = options.latitude;
+    if (!options.originGiven && !GeoIsNone(options.projection)) {
+        // The geographic position of the lower-left cell centre.
+        GeoHandle frame = 0;
+        int status = 0;
+        GeoFrameOpen(frame, options.projection, 0.0, 0.0, 0.0, &status);
+        if (status != 0) return "unknown projection: " + options.projection;
+        const double half = centre ? 0.0 : 0.5 * cell;
+        GeoFrameProj2Geo(frame, x0 + half, y0 + half, lon, lat, &status);
+        GeoClose(frame);
+        if (status != 0) return input + ": the grid's corner lies outside the projection";
+    } else if (!GeoIsNone(options.projection)) {
+        GeoHandle frame = 0;
+        int status = 0;
+        GeoFrameOpen(frame, options.projection, lon, lat, options.orientation, &status);
+        if (status != 0) return "unknown projection: " + options.projection;
+        GeoClose(frame);
+    }
+    return WriteData(output, [&](const std::string& part, int& status) -> std::string {
+        XolFile f = XolCreateHeader(options.title.empty() ? options.name : options.title, 1, 2,
+                                    {.appTitle = "bwdata"}, &status);
+        if (status != 0) return "";
+        XolSetItem(f, 1, options.type, options.name, options.unit, &status);
+        XolSetAxis(f, 1, static_cast<float>(cell), 0.0f, static_cast<int>(ncols));
+        XolSetAxis(f, 2, static_cast<float>(cell), 0.0f, static_cast<int>(nrows));
+        XolSetProjection(f, options.projection, lon, lat, options.orientation);
+        XolCreateFile(f, part, &status);
+        if (status == 0) XolWriteDynamic(f, map.data(), &status);
+        XolClose(f);
+        return "";
+    });
+}
+
+std::string ImportCsv(const std::string& input, const std::string& output,
+                      const CsvOptions& options) {
+    std::ifstream in(input);
+    if (!in) return input + ": can't be opened";
+    DateTime start;
+    if (!ParseDateTime(options.start, start))
+        return "--start needs a date and time as \"YYYY-MM-DD hh:mm:ss\", not \"" + options.start +
+               "\"";
+    std::string line;
+    int lineNo = 0;
+    std::vector<std::string> names;
+    std::vector<double> times;
+    std::vector<float> values;
+    size_t width = 0;
+    while (std::getline(in, line)) {
+        ++lineNo;
+        line = Trimmed(line);
+        if (line.empty()) continue;
+        const auto fields = Split(line, ',');
+        double t = 0;
+        if (times.empty() && names.empty() && !Number(fields[0], t)) {
+            for (size_t i = 1; i < fields.size(); ++i) names.push_back(Trimmed(fields[i]));
+            continue;
+        }
+        if (!Number(fields[0], t))
+            return Where(input, lineNo) + "the time '" + fields[0] + "' is not a number";
+        if (width == 0) width = fields.size();
+        if (fields.size() != width || width < 2)
+            return Where(input, lineNo) + std::to_string(fields.size()) + " fields, not " +
+                   std::to_string(width);
+        for (size_t i = 1; i < fields.size(); ++i) {
+            double v = 0;
+            if (Trimmed(fields[i]).empty())
+                v = kDeleteValue;
+            else if (!Number(fields[i], v))
+                return Where(input, lineNo) + "'" + Trimmed(fields[i]) + "' is not a number";
+            values.push_back(static_cast<float>(v));
+        }
+        times.push_back(t);
+        if (times.size() >= 3) {
+            const double step = times[1] - times[0];
+            const double gap = times.back() - times[times.size() - 2];
+            if (std::fabs(gap - step) > 1e-6 * std::max(1.0, std::fabs(step)))
+                return Where(input, lineNo) + "the time column is not equidistant";
+        }
+    }
+    if (times.empty()) return input + ": no rows of values";
+    const size_t items = width - 1;
+    if (times.size() >= 2 && times[1] <= times[0])
+        return input + ": the time must grow from row to row";
+    const double step = times.size() >= 2 ? times[1] - times[0] : 1.0;
+    if (!options.line) {
+        if (names.size() != items) return input + ": the header line must name every item";
+        if ((!options.types.empty() && options.types.size() != items) ||
+            (!options.units.empty() && options.units.size() != items))
+            return "--types and --units need one code for each of the " + std::to_string(items) +
+                   " items";
+    }
+    const size_t fileItems = options.line ? 1 : items;
+    std::vector<int> types(fileItems,
+                           options.line && !options.types.empty() ? options.types[0] : 999);
+    std::vector<int> units(fileItems,
+                           options.line && !options.units.empty() ? options.units[0] : 1000);
+    if (!options.line) {
+        if (!options.types.empty()) types = options.types;
+        if (!options.units.empty()) units = options.units;
+    }
+    for (size_t i = 0; i < fileItems; ++i)
+        if (std::string e = CheckType(types[i], units[i], input); !e.empty()) return e;
+
+    const std::string first = DateTimeText(AddSeconds(start, times[0]));
+    return WriteData(output, [&](const std::string& part, int& status) -> std::string {
+        XolFile f = XolCreateHeader(options.title.empty() ? input : options.title,
+                                    static_cast<int>(fileItems), options.line ? 1 : 0,
+                                    {.appTitle = "bwdata"}, &status);
+        if (status != 0) return "";
+        for (size_t i = 0; i < fileItems; ++i)
+            XolSetItem(f, static_cast<int>(i + 1), types[i], options.line ? options.name : names[i],
+                       units[i], &status);
+        if (options.line) XolSetAxis(f, 1, options.dx, 0.0f, static_cast<int>(items));
+        XolSetCalendarAxis(f, step, first);
+        XolCreateFile(f, part, &status);
+        for (size_t s = 0; s < times.size() && status == 0; ++s) {
+            if (options.line)
+                XolWriteDynamic(f, &values[s * items], &status);
+            else
+                for (size_t i = 0; i < items && status == 0; ++i)
+                    XolWriteDynamic(f, &values[s * items + i], &status);
+        }
+        XolClose(f);
+        return "";
+    });
+}

@@ -12,6 +12,7 @@
 #include <fstream>
 #include <iterator>
 
+#include "platform/geo/geo.hpp"
 #include "platform/qty/qty.hpp"
 #include "platform/xolio/xolio_record.hpp"
 
@@ -68,7 +69,7 @@ double SecondsPer(int timeUnit) {
 
 // The dimensions of an item's axes, named x, y, ... with coordinate variables;
 // an item whose axes differ from those of the same name gets its own.
-int DefineAxes(int ncid, const XolItemRec& item, int* dimids) {
+int DefineAxes(int ncid, const XolItemRec& item, int* dimids, GeoHandle frame) {
     for (int d = 0; d < item.dims; ++d) {
         for (int variant = 0;; ++variant) {
             std::string name = kAxisNames[d];
@@ -92,10 +93,14 @@ int DefineAxes(int ncid, const XolItemRec& item, int* dimids) {
             int status = nc_def_dim(ncid, name.c_str(), static_cast<size_t>(item.count[d]), &dim);
             int var = -1;
             if (status == NC_NOERR)
-                status = nc_def_var(ncid, name.c_str(), NC_FLOAT, 1, &dim, &var);
+                status = nc_def_var(ncid, name.c_str(), NC_DOUBLE, 1, &dim, &var);
             if (status != NC_NOERR) return NcFail(kXolErrWrite, status, "axis " + name);
             PutText(ncid, var, "units", qtyGetCfUnit(item.axisUnit));
             if (kAxisLetters[d][0] != '\0') PutText(ncid, var, "axis", kAxisLetters[d]);
+            double turn = 0.0;
+            if (frame != 0 && d < 2 && GeoProjectionNorth(frame, turn) == 0 && turn == 0.0)
+                PutText(ncid, var, "standard_name",
+                        d == 0 ? "projection_x_coordinate" : "projection_y_coordinate");
             nc_put_att_float(ncid, var, "origin", NC_FLOAT, 1, &item.origin[d]);
             nc_put_att_float(ncid, var, "spacing", NC_FLOAT, 1, &item.spacing[d]);
             nc_put_att_int(ncid, var, "unit_code", NC_INT, 1, &item.axisUnit);
@@ -107,7 +112,10 @@ int DefineAxes(int ncid, const XolItemRec& item, int* dimids) {
     return 0;
 }
 
-void WriteAxisValues(int ncid, const XolItemRec& item) {
+// The values of an axis: model coordinates, or projected ones where the grid
+// lies unturned on a real map projection, so that the tools of the field
+// place it on the earth.
+void WriteAxisValues(int ncid, const XolItemRec& item, GeoHandle frame) {
     for (int d = 0; d < item.dims; ++d) {
         for (int variant = 0;; ++variant) {
             std::string name = kAxisNames[d];
@@ -124,23 +132,35 @@ void WriteAxisValues(int ncid, const XolItemRec& item) {
             if (static_cast<int>(length) != item.count[d] || origin != item.origin[d] ||
                 spacing != item.spacing[d])
                 continue;
-            std::vector<float> values(length);
-            for (size_t i = 0; i < length; ++i)
-                values[i] = item.origin[d] + static_cast<float>(i) * item.spacing[d];
+            std::vector<double> values(length);
+            double turn = 0.0;
+            const bool projected =
+                frame != 0 && d < 2 && GeoProjectionNorth(frame, turn) == 0 && turn == 0.0;
+            for (size_t i = 0; i < length; ++i) {
+                const double model = static_cast<double>(item.origin[d]) +
+                                     static_cast<double>(i) * static_cast<double>(item.spacing[d]);
+                double east = model, north = model;
+                if (projected)
+                    GeoXy2Proj(frame, d == 0 ? model : 0.0, d == 1 ? model : 0.0, east, north);
+                values[i] = d == 0 ? east : north;
+            }
             const size_t start = 0;
-            nc_put_vara_float(ncid, var, &start, &length, values.data());
+            nc_put_vara_double(ncid, var, &start, &length, values.data());
             break;
         }
     }
 }
 
+const char* StandardName(int type);
+void DefineProjectedPoints(int ncid, int yDim, int xDim);
+
 int DefineItem(int ncid, const XolItemRec& item, int index, bool dynamic, int timeDim,
-               float deleteValue, int& varid) {
+               float deleteValue, GeoHandle frame, int& varid) {
     int dims[5];
     int n = 0;
     if (dynamic) dims[n++] = timeDim;
     int axes[4];
-    if (int code = DefineAxes(ncid, item, axes)) return code;
+    if (int code = DefineAxes(ncid, item, axes, frame)) return code;
     for (int d = item.dims - 1; d >= 0; --d) dims[n++] = axes[d];  // x varies fastest
     std::string name = VariableName(item.name, 0);
     for (int k = 1; nc_inq_varid(ncid, name.c_str(), &varid) == NC_NOERR; ++k)
@@ -155,7 +175,74 @@ int DefineItem(int ncid, const XolItemRec& item, int index, bool dynamic, int ti
     nc_put_att_int(ncid, varid, "item_unit", NC_INT, 1, &item.unit);
     nc_put_att_int(ncid, varid, "item_number", NC_INT, 1, &index);
     PutText(ncid, varid, "item_kind", dynamic ? "dynamic" : "static");
+    if (const char* standard = StandardName(item.type))
+        PutText(ncid, varid, "standard_name", standard);
+    double turn = 0.0;
+    if (frame != 0 && item.dims == 2) {
+        PutText(ncid, varid, "grid_mapping", "crs");
+        if (GeoProjectionNorth(frame, turn) == 0 && turn != 0.0) {
+            DefineProjectedPoints(ncid, axes[1], axes[0]);
+            PutText(ncid, varid, "coordinates", "projection_y projection_x");
+        }
+    }
     return 0;
+}
+
+// The CF standard name of an item type, where the table has one.
+const char* StandardName(int type) {
+    switch (type) {
+        case 100078:
+            return "sea_surface_height_above_mean_sea_level";
+        case 100280:
+            return "sea_floor_depth_below_sea_surface";
+        case 100097:
+            return "sea_surface_wave_significant_height";
+        default:
+            return nullptr;
+    }
+}
+
+// The grid mapping of a file on a real map projection: the variable "crs"
+// with the CRS as WKT.
+void DefineGridMapping(int ncid, const XolHeaderRec& h, GeoHandle frame) {
+    std::string wkt;
+    GeoCrsWkt(frame, wkt);
+    int crs = -1;
+    if (nc_def_var(ncid, "crs", NC_INT, 0, nullptr, &crs) != NC_NOERR) return;
+    PutText(ncid, crs, "crs_wkt", wkt);
+    PutText(ncid, crs, "spatial_ref", wkt);
+    PutText(ncid, crs, "long_name", h.projection);
+}
+
+// For a grid turned on its map: the projected coordinates of every point as
+// two-dimensional auxiliary coordinates.
+void DefineProjectedPoints(int ncid, int yDim, int xDim) {
+    const int dims[2] = {yDim, xDim};
+    const char* names[2] = {"projection_x", "projection_y"};
+    for (int a = 0; a < 2; ++a) {
+        int var = -1;
+        if (nc_inq_varid(ncid, names[a], &var) == NC_NOERR) continue;
+        if (nc_def_var(ncid, names[a], NC_DOUBLE, 2, dims, &var) != NC_NOERR) continue;
+        PutText(ncid, var, "standard_name",
+                a == 0 ? "projection_x_coordinate" : "projection_y_coordinate");
+        PutText(ncid, var, "units", "m");
+    }
+}
+
+void WriteProjectedPoints(int ncid, const XolItemRec& item, GeoHandle frame) {
+    int xv = -1, yv = -1;
+    if (nc_inq_varid(ncid, "projection_x", &xv) != NC_NOERR ||
+        nc_inq_varid(ncid, "projection_y", &yv) != NC_NOERR)
+        return;
+    const size_t nx = static_cast<size_t>(item.count[0]), ny = static_cast<size_t>(item.count[1]);
+    std::vector<double> east(nx * ny), north(nx * ny);
+    for (size_t k = 0; k < ny; ++k)
+        for (size_t j = 0; j < nx; ++j)
+            GeoXy2Proj(frame, item.origin[0] + static_cast<double>(j) * item.spacing[0],
+                       item.origin[1] + static_cast<double>(k) * item.spacing[1], east[k * nx + j],
+                       north[k * nx + j]);
+    nc_put_var_double(ncid, xv, east.data());
+    nc_put_var_double(ncid, yv, north.data());
 }
 
 void WriteGlobals(int ncid, const XolHeaderRec& h) {
@@ -364,9 +451,13 @@ int xolFileCreate(const std::string& path, XolHandle header, XolHandle* file) {
         PutText(ncid, f->timeVar, "units", "s");
     }
     WriteGlobals(ncid, *h);
+    if (h->geo && !GeoIsNone(h->projection) &&
+        GeoOpen(&f->frame, h->projection, h->longitude, h->latitude, h->orientation) == 0)
+        DefineGridMapping(ncid, *h, f->frame);
     for (size_t i = 0; i < h->items.size(); ++i) {
         if (int code = DefineItem(ncid, h->items[i], static_cast<int>(i + 1), true, timeDim,
-                                  h->deleteValue, h->items[i].varid)) {
+                                  h->deleteValue, f->frame, h->items[i].varid)) {
+            GeoClose(f->frame);
             nc_close(ncid);
             delete f;
             return code;
@@ -380,7 +471,10 @@ int xolFileCreate(const std::string& path, XolHandle header, XolHandle* file) {
         delete f;
         return NcFail(kXolErrWrite, status, path);
     }
-    for (const auto& item : h->items) WriteAxisValues(ncid, item);
+    for (const auto& item : h->items) {
+        WriteAxisValues(ncid, item, f->frame);
+        if (f->frame != 0 && item.dims == 2) WriteProjectedPoints(ncid, item, f->frame);
+    }
     h->steps = 0;
     *file = XolRegister(f);
     return 0;
@@ -395,11 +489,13 @@ int xolStaticWrite(XolHandle file, XolHandle staticItem, const float* values) {
     int status = nc_redef(f->ncid);
     if (status != NC_NOERR) return NcFail(kXolErrWrite, status, f->path);
     const int index = -static_cast<int>(h.statics.size());
-    if (int code = DefineItem(f->ncid, *item, index, false, -1, h.deleteValue, item->varid))
+    if (int code =
+            DefineItem(f->ncid, *item, index, false, -1, h.deleteValue, f->frame, item->varid))
         return code;
     status = nc__enddef(f->ncid, 16384, 4, 0, 4);
     if (status != NC_NOERR) return NcFail(kXolErrWrite, status, f->path);
-    WriteAxisValues(f->ncid, *item);
+    WriteAxisValues(f->ncid, *item, f->frame);
+    if (f->frame != 0 && item->dims == 2) WriteProjectedPoints(f->ncid, *item, f->frame);
     std::vector<float> data(values, values + item->Size());
     Convert(*item, data, true, h.deleteValue);
     UpdateStatistics(*item, data.data(), data.size(), h.deleteValue);
@@ -445,6 +541,7 @@ int xolFileClose(XolHandle file) {
     XolFileRec* f = XolFileOf(file);
     if (f == nullptr) return XolFail(kXolErrArgument, "not a file");
     const int status = nc_close(f->ncid);
+    GeoClose(f->frame);
     XolForget(f);
     const std::string path = f->path;
     delete f;
@@ -598,6 +695,11 @@ int xolFileRead(const std::string& path, XolHandle* header, XolHandle* file) {
         int dimid = -1;
         if (nc_inq_dimid(ncid, name, &dimid) == NC_NOERR) continue;  // a coordinate
         if (std::strcmp(name, "crs") == 0 || GetText(ncid, var, "grid_mapping_name") != "")
+            continue;
+        // Auxiliary coordinates are no items.
+        const std::string standard = GetText(ncid, var, "standard_name");
+        if (standard == "projection_x_coordinate" || standard == "projection_y_coordinate" ||
+            standard == "latitude" || standard == "longitude")
             continue;
         if (type != NC_FLOAT && type != NC_DOUBLE && type != NC_SHORT && type != NC_INT &&
             type != NC_BYTE)

@@ -73,6 +73,7 @@ struct XolFileRec {
     size_t step = 0;          // the step it belongs to
     size_t staticCursor = 0;  // the next static item to hand out when reading
     bool timeless = false;    // a file without a time dimension: one step
+    uint64_t frame = 0;       // the map frame of a file on a real map projection, when writing
 };
 
 // Handle checks: the record of a live handle, or nullptr.

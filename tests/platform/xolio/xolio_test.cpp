@@ -302,3 +302,52 @@ TEST(DataFiles, MalformedFilesGiveACodeNeverACrash) {
 }
 
 }  // namespace
+
+namespace {
+
+TEST(DataFiles, AFileOnARealProjectionCarriesItsGridMapping) {
+    bwtest::TempDir dir;
+    for (double orientation : {0.0, 30.0}) {
+        const std::string path = dir / ("utm" + std::to_string(int(orientation)) + ".xol2");
+        XolHandle h = 0, f = 0;
+        xolHeaderCreate(1, "utm", "bw", 0, 1, 1, &h);
+        xolSetGeoInfoUTMProj(h, "UTM-32", 9.0, 54.0, orientation);
+        xolSetItemInfo(xolItemD(h, 1), 100078, "Surface elevation", 1000, 1);
+        xolSetItemAxisEqD2(xolItemD(h, 1), 1000, 3, 2, 0.0f, 0.0f, 10.0f, 10.0f);
+        ASSERT_EQ(xolFileCreate(path, h, &f), 0) << xolLastErrorText();
+        const float values[6] = {1, 2, 3, 4, 5, 6};
+        xolWriteItemTimeStep(h, f, 0.0, values);
+        xolFileClose(f);
+        xolHeaderDestroy(h);
+
+        const std::string dump =
+            bwtest::RunProgram({"/usr/bin/ncdump", path}, dir.path.string()).out;
+        EXPECT_NE(dump.find("crs:crs_wkt = \"PROJCRS[\\\"WGS 84 / UTM zone 32N\\\""),
+                  std::string::npos)
+            << dump;
+        EXPECT_NE(dump.find("Surface_elevation:grid_mapping = \"crs\""), std::string::npos);
+        EXPECT_NE(dump.find("standard_name = \"sea_surface_height_above_mean_sea_level\""),
+                  std::string::npos);
+        if (orientation == 0.0) {
+            // The origin lies on the central meridian of zone 32, 9 degrees east: easting 500000.
+            EXPECT_NE(dump.find(" x = 500000, 500010, 500020 ;"), std::string::npos) << dump;
+        } else {
+            EXPECT_NE(dump.find("Surface_elevation:coordinates = \"projection_y projection_x\""),
+                      std::string::npos);
+            EXPECT_NE(dump.find("500008.66025"),
+                      std::string::npos);  // 10 m along x, turned 30 degrees
+        }
+        // Reading it back: the auxiliary coordinates are no items, the axes are the model's.
+        ASSERT_EQ(xolFileRead(path, &h, &f), 0) << xolLastErrorText();
+        EXPECT_EQ(xolGetNoOfItems(h), 1);
+        int unit, counts[4];
+        float origins[4], spacings[4];
+        xolGetItemAxisEq(xolItemD(h, 1), &unit, counts, origins, spacings);
+        EXPECT_EQ(origins[0], 0.0f);
+        EXPECT_EQ(spacings[0], 10.0f);
+        xolFileClose(f);
+        xolHeaderDestroy(h);
+    }
+}
+
+}  // namespace

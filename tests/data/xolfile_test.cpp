@@ -138,6 +138,35 @@ TEST(DataFileLayer, FailuresGiveTheirCodes) {
     EXPECT_EQ(status, kXolBadAxis);
     EXPECT_EQ(XolErrorText(109), "Unknown error: 109");
 
+    // A file of another file type, one without items, one with an unknown kind of time axis.
+    XolHeaderOptions type4;
+    type4.fileTypeFlag = true;
+    f = XolCreateHeader("t", 1, 0, type4);
+    XolSetItem(f, 1, 999, "a", 0);
+    XolCreateFile(f, dir / "type4.xol0");
+    XolClose(f);
+    XolOpenRead(dir / "type4.xol0", &status);
+    EXPECT_EQ(status, kXolBadFileType);
+    const struct {
+        const char* name;
+        const char* cdl;
+        int code;
+    } files[] = {{"empty", "netcdf e {\ndimensions:\n x = 2 ;\n}\n", kXolBadItemNumber},
+                 {"clock",
+                  "netcdf c {\ndimensions:\n time = UNLIMITED ;\nvariables:\n float a(time) ;\n"
+                  "// global attributes:\n :time_axis_type = 2 ;\ndata:\n a = 1, 2 ;\n}\n",
+                  kXolBadTimeAxis}};
+    for (const auto& c : files) {
+        bwtest::WriteFile(dir / (std::string(c.name) + ".cdl"), c.cdl);
+        ASSERT_EQ(bwtest::RunProgram({"/usr/bin/ncgen", "-5", "-o", std::string(c.name) + ".nc",
+                                      std::string(c.name) + ".cdl"},
+                                     dir.path.string())
+                      .exitCode,
+                  0);
+        XolOpenRead(dir / (std::string(c.name) + ".nc"), &status);
+        EXPECT_EQ(status, c.code) << c.name;
+    }
+
     setenv("TRF", "HUD", 1);
     EXPECT_EXIT(XolOpenRead(dir / "absent.xol2"), testing::ExitedWithCode(1),
                 "XOL open error on .*absent.xol2");

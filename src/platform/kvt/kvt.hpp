@@ -52,14 +52,6 @@ KvtHandle kvtSectionByNameNum(KvtHandle parent, const char* name, int instance);
 KvtHandle kvtKeywordByNameNum(KvtHandle section, const char* name, int instance);
 KvtHandle kvtParamByNum(KvtHandle keyword, int number);
 
-// Walking a tree in file order without knowing its names: the number-th child
-// (from 1) of a file (its targets), of a target or section (its sections and
-// keywords, mixed as they stand) or of a keyword (its parameters). Null with
-// kKvtErrNotFound past the last one.
-KvtHandle kvtChildByNum(KvtHandle node, int number);
-// True for a keyword; false for a file, target, section or parameter.
-bool kvtIsKeyword(KvtHandle node);
-
 // Depth in the tree: a target is at level 0, its sections at 1, and so on.
 int kvtGetLevel(KvtHandle node);
 // The path from the target down, names joined by '.': "TARGET.Section.Sub".
@@ -76,20 +68,16 @@ bool kvtIsFilename(KvtHandle param);
 // Values. An integer may be read as a real; a text may be read as a file
 // name. Every other mismatch sets kKvtErrKind and returns 0, false or null.
 int32_t kvtGetInt(KvtHandle param);
-// A real or integer rounded to the nearest 32-bit real (beyond its range: infinity).
 float kvtGetFloat(KvtHandle param);
 double kvtGetDouble(KvtHandle param);
 bool kvtGetBool(KvtHandle param);
 const char* kvtGetString(KvtHandle param);
 const char* kvtGetFilename(KvtHandle param);
 // The file name as a full path (at most 2047 characters): relative names are
-// taken from the folder of the file that holds them (the working folder for a
-// tree built in memory); absolute ones stay. A longer path gives null and
-// kKvtErrRange.
+// taken from the folder of the file that holds them; absolute ones stay.
 const char* kvtGetResultFilenamePath(KvtHandle param);
 
-// Ends a tree, loaded or built, and sets the handle to 0. Only the file handle
-// ends a tree; any other handle is refused with kKvtErrHandle.
+// Ends a tree, loaded or built, and sets the handle to 0.
 void kvtClose(KvtHandle* file);
 
 // Writing.
@@ -108,5 +96,4 @@ int kvtAddString(KvtHandle file, const char* value);
 int kvtAddFilename(KvtHandle file, const char* value);
 // Writes the tree in the syntax above, four blanks a level; doubles with 17
 // and 32-bit reals with 9 significant digits, so that it loads back the same.
-// A keyword without parameters can't be written: kKvtErrBuild, no file.
 int kvtWrite(KvtHandle file, const char* path);

@@ -35,6 +35,18 @@ bool BaseUnit(int32_t type, int32_t unit, int32_t& base) {
     return qtyGetItemUnitSeq(type, 1, base, text);
 }
 
+// An item entry as a writer describes it.
+XolItem MakeItem(int32_t type, const std::string& name, int32_t unit) {
+    XolItem item;
+    item.type = type;
+    item.name = Cut(name, 32);
+    item.unit = unit;
+    if (!BaseUnit(type, unit, item.baseUnit)) item.baseUnit = unit;
+    item.typeText = TypeText(type);
+    item.unitText = UnitText(item.baseUnit);
+    return item;
+}
+
 // A failure: into the status when there is one, else the stop of the run.
 void Fail(XolFile& file, int code, int* status, const std::string& stopText = "") {
     file.lastError = code;
@@ -372,13 +384,7 @@ XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimensi
 void XolSetItem(XolFile& f, int32_t n, int32_t type, const std::string& name, int32_t unit,
                 int* status) {
     if (n < 1 || n > f.noDynamicItems) return Fail(f, kXolBadItemNumber, status);
-    XolItem& item = f.dynamicItems[static_cast<size_t>(n - 1)];
-    item.type = type;
-    item.name = Cut(name, 32);
-    item.unit = unit;
-    if (!BaseUnit(type, unit, item.baseUnit)) item.baseUnit = unit;
-    item.typeText = TypeText(type);
-    item.unitText = UnitText(item.baseUnit);
+    f.dynamicItems[static_cast<size_t>(n - 1)] = MakeItem(type, name, unit);
     Succeed(status);
 }
 
@@ -440,13 +446,7 @@ void XolWriteStatic(XolFile& f, const float* values, int32_t type, const std::st
                     int32_t unit, int* status) {
     if (f.position >= 1) return Fail(f, kXolStaticWriteAfterDynamic, status);
     const XolHandle st = xolStaticCreate(f.header);
-    XolItem item;
-    item.type = type;
-    item.name = Cut(name, 32);
-    item.unit = unit;
-    if (!BaseUnit(type, unit, item.baseUnit)) item.baseUnit = unit;
-    item.typeText = TypeText(type);
-    item.unitText = UnitText(item.baseUnit);
+    const XolItem item = MakeItem(type, name, unit);
     f.staticItems.push_back(item);
     f.noStaticItems = static_cast<int32_t>(f.staticItems.size());
     if (int code = DefineItem(f, xolItemS(st), item)) return Fail(f, code, status);

@@ -44,13 +44,22 @@ KvtHandle kvtLoadFile(const char* path, int option, KvtHandle* file);
 // relative file names are resolved against).
 KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHandle* file);
 int kvtPeekErrorGlb();
-// The last syntax error: line and column from 1, and a short text of what was expected.
+// The last syntax error: line and column from 1, and a short text of what was
+// expected; 0, 0 and "" after a clean load.
 void kvtGetSyntaxErr(KvtHandle file, int* line, int* column, const char** text);
 
 KvtHandle kvtTargetByNameNum(KvtHandle file, const char* name, int instance);
 KvtHandle kvtSectionByNameNum(KvtHandle parent, const char* name, int instance);
 KvtHandle kvtKeywordByNameNum(KvtHandle section, const char* name, int instance);
 KvtHandle kvtParamByNum(KvtHandle keyword, int number);
+
+// Walking a tree in file order without knowing its names: the number-th child
+// (from 1) of a file (its targets), of a target or section (its sections and
+// keywords, mixed as they stand) or of a keyword (its parameters). Null with
+// kKvtErrNotFound past the last one.
+KvtHandle kvtChildByNum(KvtHandle node, int number);
+// True for a keyword; false for a file, target, section or parameter.
+bool kvtIsKeyword(KvtHandle node);
 
 // Depth in the tree: a target is at level 0, its sections at 1, and so on.
 int kvtGetLevel(KvtHandle node);
@@ -68,16 +77,20 @@ bool kvtIsFilename(KvtHandle param);
 // Values. An integer may be read as a real; a text may be read as a file
 // name. Every other mismatch sets kKvtErrKind and returns 0, false or null.
 int32_t kvtGetInt(KvtHandle param);
+// A real or integer rounded to the nearest 32-bit real (beyond its range: infinity).
 float kvtGetFloat(KvtHandle param);
 double kvtGetDouble(KvtHandle param);
 bool kvtGetBool(KvtHandle param);
 const char* kvtGetString(KvtHandle param);
 const char* kvtGetFilename(KvtHandle param);
 // The file name as a full path (at most 2047 characters): relative names are
-// taken from the folder of the file that holds them; absolute ones stay.
+// taken from the folder of the file that holds them (the working folder for a
+// tree built in memory); absolute ones stay. A longer path gives null and
+// kKvtErrRange.
 const char* kvtGetResultFilenamePath(KvtHandle param);
 
-// Ends a tree, loaded or built, and sets the handle to 0.
+// Ends a tree, loaded or built, and sets the handle to 0. Only the file handle
+// ends a tree; any other handle is refused with kKvtErrHandle.
 void kvtClose(KvtHandle* file);
 
 // Writing.
@@ -87,7 +100,8 @@ int kvtAddSection(KvtHandle file, const char* name);
 // Ends the section (or target) opened last.
 int kvtEndSection(KvtHandle file);
 int kvtAddKeyword(KvtHandle file, const char* name);
-// Each adds one more parameter to the keyword added last.
+// Each adds one more parameter to the keyword added last. A null text, or one
+// with a line break, is refused with kKvtErrBuild.
 int kvtAddInt(KvtHandle file, int32_t value);
 int kvtAddFloat(KvtHandle file, float value);
 int kvtAddDouble(KvtHandle file, double value);
@@ -96,4 +110,5 @@ int kvtAddString(KvtHandle file, const char* value);
 int kvtAddFilename(KvtHandle file, const char* value);
 // Writes the tree in the syntax above, four blanks a level; doubles with 17
 // and 32-bit reals with 9 significant digits, so that it loads back the same.
+// A keyword without parameters can't be written: kKvtErrBuild, no file.
 int kvtWrite(KvtHandle file, const char* path);

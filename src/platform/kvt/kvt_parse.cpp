@@ -1,20 +1,37 @@
-// The loader of parameter files: a hand-written recursive reader that builds
-// the tree and stops at the first syntax error with its line and column.
-#include <cctype>
-#include <cerrno>
-#include <cstdlib>
+// The loader of parameter files: a hand-written reader that builds the tree as
+// it goes and stops at the first syntax error, with its line, its column in
+// characters (UTF-8 code points, a tab is one) and a text of what was
+// expected. Open targets and sections are kept on a stack of their own, so the
+// depth of nesting is bounded by memory and not by the call stack.
+//
+// Grammar, one statement a line ('}' may close a block behind a statement):
+//   file      = { target }
+//   target    = name '{' { statement } '}'
+//   statement = name '{' { statement } '}' | name '=' value { ',' value }
+//   value     = integer | real | logical | "text" | file("text")
+// A '{' may stand on the line of its name or on a later one.
+#include <charconv>
 #include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <string>
+#include <vector>
 
-#include "platform/kvt/kvt_store.hpp"
+#include "platform/kvt/kvt_internal.hpp"
 
 namespace {
+
+struct Place {
+    int line = 1;
+    int column = 1;
+};
 
 struct Cursor {
     const char* text;
     size_t length;
     size_t pos = 0;
-    int line = 1;
-    int column = 1;  // characters, not bytes: UTF-8 continuation bytes don't count
+    Place place;
 
     bool AtEnd() const { return pos >= length; }
     char Peek(size_t ahead = 0) const { return pos + ahead < length ? text[pos + ahead] : '\0'; }
@@ -22,57 +39,66 @@ struct Cursor {
         if (AtEnd()) return;
         const unsigned char c = static_cast<unsigned char>(text[pos++]);
         if (c == '\n') {
-            ++line;
-            column = 1;
-        } else if ((c & 0xC0) != 0x80) {
-            ++column;
+            ++place.line;
+            place.column = 1;
+        } else if ((c & 0xC0) != 0x80) {  // continuation bytes are not characters
+            ++place.column;
         }
+    }
+    void Advance(size_t count) {
+        for (size_t i = 0; i < count; ++i) Advance();
     }
 };
 
-struct Place {
-    int line, column;
+bool IsLetter(char c) {
+    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
+}
+bool IsDigit(char c) {
+    return c >= '0' && c <= '9';
+}
+
+std::string Lower(std::string word) {
+    for (char& c : word)
+        if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+    return word;
+}
+
+struct Value {
+    KvtValueKind kind = KvtValueKind::Integer;
+    int64_t integer = 0;
+    double real = 0.0;
+    bool logical = false;
+    std::string text;
 };
 
 struct Parser {
     KvtTree& tree;
     Cursor cur;
-    bool failed = false;
-
-    Place Here() const { return {cur.line, cur.column}; }
 
     bool Fail(Place at, const char* text) {
-        if (!failed) {
-            failed = true;
-            tree.errorLine = at.line;
-            tree.errorColumn = at.column;
-            tree.errorText = text;
-        }
+        tree.errorLine = at.line;
+        tree.errorColumn = at.column;
+        tree.errorText = text;
         return false;
     }
 
-    static bool IsLetter(char c) {
-        return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
-    }
-    static bool IsDigit(char c) { return c >= '0' && c <= '9'; }
-
     void SkipBlanks() {
         while (cur.Peek() == ' ' || cur.Peek() == '\t' || cur.Peek() == '\r') cur.Advance();
-    }
-    void SkipComment() {
-        if (cur.Peek() == '#')
-            while (!cur.AtEnd() && cur.Peek() != '\n') cur.Advance();
     }
     // Blanks, comments and line ends.
     void SkipSpace() {
         for (;;) {
             SkipBlanks();
-            SkipComment();
-            if (cur.Peek() == '\n')
-                cur.Advance();
-            else
-                return;
+            if (cur.Peek() == '#')
+                while (!cur.AtEnd() && cur.Peek() != '\n') cur.Advance();
+            if (cur.AtEnd() || cur.Peek() != '\n') return;
+            cur.Advance();
         }
+    }
+    // The end of a statement: the line's end, a comment or a closing '}'.
+    bool AtStatementEnd() const {
+        const char c = cur.Peek();
+        return cur.AtEnd() || c == '\n' || c == '#' || c == '}';
     }
 
     std::string ReadName() {
@@ -81,11 +107,11 @@ struct Parser {
         return std::string(cur.text + start, cur.pos - start);
     }
 
-    // A quoted text; the cursor stands on the opening quote.
+    // A quoted text on one line; the cursor stands on the opening quote. \" and
+    // \\ are escapes, a backslash before anything else is itself.
     bool ReadQuoted(std::string& out) {
-        const Place open = Here();
+        const Place open = cur.place;
         cur.Advance();
-        out.clear();
         for (;;) {
             if (cur.AtEnd() || cur.Peek() == '\n') return Fail(open, "unterminated text");
             const char c = cur.Peek();
@@ -93,178 +119,172 @@ struct Parser {
                 cur.Advance();
                 return true;
             }
-            if (c == '\\' && (cur.Peek(1) == '"' || cur.Peek(1) == '\\')) {
-                cur.Advance();
-                out += cur.Peek();
-                cur.Advance();
-                continue;
-            }
-            out += c;
+            if (c == '\0') return Fail(cur.place, "a text can't hold a NUL character");
+            if (c == '\\' && (cur.Peek(1) == '"' || cur.Peek(1) == '\\')) cur.Advance();
+            out += cur.Peek();
             cur.Advance();
         }
     }
 
-    bool ReadNumber(KvtNode& p) {
-        const Place start = Here();
+    // A number, inf or nan, with an optional sign.
+    bool ReadNumber(Value& v) {
+        const Place start = cur.place;
         const size_t begin = cur.pos;
         if (cur.Peek() == '+' || cur.Peek() == '-') cur.Advance();
+        const size_t unsignedBegin = cur.pos;
         if (IsLetter(cur.Peek())) {
-            std::string word = ReadName();
-            for (char& ch : word)
-                ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
-            if (word != "inf" && word != "infinity" && word != "nan")
-                return Fail(start, "expected a value");
-            p.valueKind = KvtValueKind::Real;
-            p.real = word == "nan" ? std::strtod("nan", nullptr) : std::strtod("inf", nullptr);
-            if (cur.text[begin] == '-') p.real = -p.real;
-            return true;
-        }
-        bool real = false;
-        size_t digits = 0;
-        while (IsDigit(cur.Peek())) cur.Advance(), ++digits;
-        if (cur.Peek() == '.') {
-            real = true;
-            cur.Advance();
-            while (IsDigit(cur.Peek())) cur.Advance(), ++digits;
-        }
-        if (digits == 0) return Fail(start, "expected a value");
-        if (cur.Peek() == 'e' || cur.Peek() == 'E') {
-            const size_t sign = (cur.Peek(1) == '+' || cur.Peek(1) == '-') ? 1 : 0;
-            if (!IsDigit(cur.Peek(1 + sign))) return Fail(start, "malformed number");
-            real = true;
-            cur.Advance();
-            if (sign) cur.Advance();
-            while (IsDigit(cur.Peek())) cur.Advance();
-        }
-        if (IsLetter(cur.Peek()) || IsDigit(cur.Peek()) || cur.Peek() == '.')
-            return Fail(start, "malformed number");
-        const std::string token(cur.text + begin, cur.pos - begin);
-        errno = 0;
-        if (real) {
-            p.valueKind = KvtValueKind::Real;
-            p.real = std::strtod(token.c_str(), nullptr);
+            const std::string word = Lower(ReadName());
+            if (word != "inf" && word != "nan") return Fail(start, "malformed number");
         } else {
-            p.valueKind = KvtValueKind::Integer;
-            p.integer = std::strtoll(token.c_str(), nullptr, 10);
-            if (errno == ERANGE) return Fail(start, "integer out of range");
+            size_t digits = 0;
+            bool real = false;
+            while (IsDigit(cur.Peek())) cur.Advance(), ++digits;
+            if (cur.Peek() == '.') {
+                real = true;
+                cur.Advance();
+                while (IsDigit(cur.Peek())) cur.Advance(), ++digits;
+            }
+            if (digits == 0) return Fail(start, "malformed number");
+            if (cur.Peek() == 'e' || cur.Peek() == 'E') {
+                const size_t sign = (cur.Peek(1) == '+' || cur.Peek(1) == '-') ? 1 : 0;
+                if (!IsDigit(cur.Peek(1 + sign))) return Fail(start, "malformed number");
+                real = true;
+                cur.Advance(1 + sign);
+                while (IsDigit(cur.Peek())) cur.Advance();
+            }
+            if (IsLetter(cur.Peek()) || cur.Peek() == '.') return Fail(start, "malformed number");
+            if (!real) {
+                // from_chars takes no '+', and a '-' only as part of the number.
+                const char* first = cur.text + (cur.text[begin] == '-' ? begin : unsignedBegin);
+                const auto r = std::from_chars(first, cur.text + cur.pos, v.integer);
+                if (r.ec != std::errc()) return Fail(start, "integer out of range");
+                v.kind = KvtValueKind::Integer;
+                return true;
+            }
         }
+        const char* first = cur.text + (cur.text[begin] == '-' ? begin : unsignedBegin);
+        const auto r = std::from_chars(first, cur.text + cur.pos, v.real);
+        if (r.ec != std::errc() || r.ptr != cur.text + cur.pos)
+            return Fail(start, "real out of range");
+        v.kind = KvtValueKind::Real;
         return true;
     }
 
     bool ReadValue(int keyword) {
-        const Place start = Here();
-        KvtNode p;
+        const Place start = cur.place;
+        Value v;
         const char c = cur.Peek();
         if (c == '"') {
-            p.valueKind = KvtValueKind::Text;
-            if (!ReadQuoted(p.text)) return false;
-        } else if (c == 'f' && cur.pos + 5 <= cur.length &&
+            v.kind = KvtValueKind::Text;
+            if (!ReadQuoted(v.text)) return false;
+        } else if (c == 'f' && cur.length - cur.pos >= 5 &&
                    std::memcmp(cur.text + cur.pos, "file(", 5) == 0) {
-            for (int i = 0; i < 5; ++i) cur.Advance();
+            cur.Advance(5);
             SkipBlanks();
-            if (cur.Peek() != '"') return Fail(Here(), "expected a quoted file name after 'file('");
-            p.valueKind = KvtValueKind::Filename;
-            if (!ReadQuoted(p.text)) return false;
+            if (cur.Peek() != '"') return Fail(cur.place, "expected a quoted name after 'file('");
+            v.kind = KvtValueKind::Filename;
+            if (!ReadQuoted(v.text)) return false;
             SkipBlanks();
-            if (cur.Peek() != ')') return Fail(Here(), "expected ')' after the file name");
+            if (cur.Peek() != ')') return Fail(cur.place, "expected ')' after the file name");
             cur.Advance();
         } else if (IsLetter(c)) {
-            std::string word = ReadName();
-            std::string lower = word;
-            for (char& ch : lower)
-                ch = static_cast<char>(std::tolower(static_cast<unsigned char>(ch)));
-            if (lower == "true" || lower == "false") {
-                p.valueKind = KvtValueKind::Logical;
-                p.logical = lower == "true";
-            } else if (lower == "inf" || lower == "infinity" || lower == "nan") {
-                p.valueKind = KvtValueKind::Real;
-                p.real = std::strtod(lower.c_str(), nullptr);
+            const Cursor wordStart = cur;
+            const std::string word = Lower(ReadName());
+            if (word == "true" || word == "false") {
+                v.kind = KvtValueKind::Logical;
+                v.logical = word == "true";
+            } else if (word == "inf" || word == "nan") {
+                cur = wordStart;
+                if (!ReadNumber(v)) return false;
             } else {
                 return Fail(start,
                             "expected a value: a number, true, false, \"text\" or file(\"name\")");
             }
         } else if (IsDigit(c) || c == '+' || c == '-' || c == '.') {
-            if (!ReadNumber(p)) return false;
+            if (!ReadNumber(v)) return false;
         } else {
-            return Fail(start, "expected a value after '='");
+            return Fail(start,
+                        "expected a value: a number, true, false, \"text\" or file(\"name\")");
         }
-        const int index = KvtAddNode(tree, keyword, KvtNodeKind::Param, "");
-        KvtNode& stored = tree.nodes[index];
-        stored.valueKind = p.valueKind;
-        stored.integer = p.integer;
-        stored.real = p.real;
-        stored.logical = p.logical;
-        stored.text = std::move(p.text);
+        KvtNode& p = tree.nodes[KvtAddNode(tree, keyword, KvtNodeKind::Param, "")];
+        p.valueKind = v.kind;
+        p.integer = v.integer;
+        p.real = v.real;
+        p.logical = v.logical;
+        p.text = std::move(v.text);
         return true;
     }
 
-    bool AtLineEnd() {
-        const char c = cur.Peek();
-        return cur.AtEnd() || c == '\n' || c == '#' || c == '}';
-    }
-
-    // After "name =": one or more values separated by commas, up to the end of the line.
+    // After "name =": one or more values separated by commas, to the statement's end.
     bool ReadValues(int keyword) {
         SkipBlanks();
-        if (AtLineEnd()) return Fail(Here(), "expected a value after '='");
+        if (AtStatementEnd()) return Fail(cur.place, "expected a value after '='");
         for (;;) {
             if (!ReadValue(keyword)) return false;
             SkipBlanks();
-            if (cur.Peek() == ',') {
-                cur.Advance();
-                SkipBlanks();
-                if (AtLineEnd()) return Fail(Here(), "expected a value after ','");
-                continue;
-            }
-            if (AtLineEnd()) return true;
-            return Fail(Here(), "expected ',' or the end of the line after a value");
+            if (AtStatementEnd()) return true;
+            if (cur.Peek() != ',')
+                return Fail(cur.place, "expected ',' or the end of the line after a value");
+            cur.Advance();
+            SkipBlanks();
+            if (AtStatementEnd()) return Fail(cur.place, "expected a value after ','");
         }
     }
 
-    // The statements of a block up to its '}' (or the end of the file at the top).
-    bool ReadBlock(int parent, Place opened) {
-        const bool top = parent == 0;
+    struct Open {
+        int node;
+        Place at;  // of its name, for "not closed"
+    };
+
+    bool Run() {
+        std::vector<Open> open;
         for (;;) {
             SkipSpace();
+            const int parent = open.empty() ? 0 : open.back().node;
             if (cur.AtEnd()) {
-                if (top) return true;
-                return Fail(opened, "a section was not closed");
+                if (open.empty()) return true;
+                const bool target = tree.nodes[parent].kind == KvtNodeKind::Target;
+                return Fail(open.back().at,
+                            target ? "a target was not closed" : "a section was not closed");
             }
             const char c = cur.Peek();
             if (c == '}') {
-                if (top) return Fail(Here(), "'}' without an open block");
+                if (open.empty()) return Fail(cur.place, "'}' without an open block");
+                open.pop_back();
                 cur.Advance();
-                return true;
+                continue;
             }
-            if (c == '{') return Fail(Here(), "expected a name before '{'");
-            if (!IsLetter(c)) return Fail(Here(), "expected a name");
-            const Place at = Here();
+            if (c == '{') return Fail(cur.place, "expected a name before '{'");
+            if (!IsLetter(c)) return Fail(cur.place, "expected a name");
+            const Place at = cur.place;
             const std::string name = ReadName();
             SkipBlanks();
             if (cur.Peek() == '=') {
-                if (top) return Fail(at, "a keyword must stand inside a target");
+                if (open.empty()) return Fail(at, "a keyword must stand inside a target");
                 cur.Advance();
                 const int keyword = KvtAddNode(tree, parent, KvtNodeKind::Keyword, name);
-                if (!ReadValues(keyword)) return false;
-                continue;
+                if (ReadValues(keyword)) continue;
+                // What was read of the line stays, but not a keyword without values.
+                if (tree.nodes[keyword].children.empty()) KvtDropLastNode(tree);
+                return false;
             }
             if (cur.Peek() == '\n' || cur.Peek() == '#') {
-                // A block may open on a later line.
-                const Cursor saved = cur;
+                // The block may open on a later line.
+                const Cursor nameEnd = cur;
                 SkipSpace();
                 if (cur.Peek() != '{') {
-                    cur = saved;
-                    return Fail(Here(), "expected '=' or '{' after a name");
+                    cur = nameEnd;
+                    return Fail(cur.place, open.empty() ? "expected '{' after a target name"
+                                                        : "expected '=' or '{' after a name");
                 }
             }
-            if (cur.Peek() == '{') {
-                cur.Advance();
-                const int node = KvtAddNode(tree, parent,
-                                            top ? KvtNodeKind::Target : KvtNodeKind::Section, name);
-                if (!ReadBlock(node, at)) return false;
-                continue;
+            if (cur.Peek() != '{') {
+                return Fail(cur.place, open.empty() ? "expected '{' after a target name"
+                                                    : "expected '=' after a keyword name");
             }
-            return Fail(Here(), "expected '=' after a keyword name");
+            cur.Advance();
+            const KvtNodeKind kind = open.empty() ? KvtNodeKind::Target : KvtNodeKind::Section;
+            open.push_back({KvtAddNode(tree, parent, kind, name), at});
         }
     }
 };
@@ -272,8 +292,38 @@ struct Parser {
 }  // namespace
 
 bool KvtParse(KvtTree& tree, const char* text, size_t length) {
-    Parser parser{tree, Cursor{text, length}};
-    // A byte-order mark at the start is not part of the file's text.
+    Parser parser{tree, Cursor{text, length, 0, Place{}}};
+    // A byte-order mark at the start is not part of the text.
     if (length >= 3 && std::memcmp(text, "\xEF\xBB\xBF", 3) == 0) parser.cur.pos = 3;
-    return parser.ReadBlock(0, Place{1, 1});
+    return parser.Run();
+}
+
+KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHandle* file) {
+    if (file != nullptr) *file = 0;
+    if (text == nullptr && length > 0) {
+        KvtSetError(kKvtErrFile);
+        return 0;
+    }
+    KvtTree* tree = KvtNewTree(path);
+    const KvtHandle handle = KvtMakeHandle(*tree, 0);
+    if (file != nullptr) *file = handle;
+    const bool clean = KvtParse(*tree, text != nullptr ? text : "", static_cast<size_t>(length));
+    KvtSetError(clean ? kKvtOk : kKvtErrSyntax);
+    return handle;
+}
+
+KvtHandle kvtLoadFile(const char* path, int /*option*/, KvtHandle* file) {
+    if (file != nullptr) *file = 0;
+    std::error_code ec;
+    if (path == nullptr || !std::filesystem::is_regular_file(path, ec)) {
+        KvtSetError(kKvtErrFile);
+        return 0;
+    }
+    std::ifstream in(path, std::ios::binary);
+    std::string text((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+    if (in.bad()) {
+        KvtSetError(kKvtErrFile);
+        return 0;
+    }
+    return kvtLoadText(text.data(), text.size(), path, file);
 }

@@ -1,83 +1,233 @@
-// The writer of parameter files: the loader's syntax, four blanks of
-// indentation a level, reals with enough digits to load back bit for bit.
+// Building a tree call by call, and writing any tree, built or loaded, in the
+// loader's syntax: four blanks of indentation a level, one keyword a line,
+// reals with enough digits to load back bit for bit (17 significant digits
+// for 64-bit reals, 9 for 32-bit ones), texts and file names escaped.
+#include <charconv>
 #include <cmath>
-#include <cstdio>
+#include <cstring>
 #include <fstream>
 #include <string>
+#include <vector>
 
-#include "platform/kvt/kvt_store.hpp"
+#include "platform/kvt/kvt_internal.hpp"
 
 namespace {
 
-std::string RealText(double value, bool single) {
-    if (std::isnan(value)) return "nan";
-    if (std::isinf(value)) return value < 0 ? "-inf" : "inf";
-    char buf[40];
-    if (single)
-        std::snprintf(buf, sizeof buf, "%.9g", static_cast<double>(static_cast<float>(value)));
-    else
-        std::snprintf(buf, sizeof buf, "%.17g", value);
-    std::string text(buf);
-    if (text.find_first_of(".eE") == std::string::npos)
-        text += ".0";  // stays a real when read back
-    return text;
+// ---- building ----------------------------------------------------------------
+
+// The tree of a handle that must be a file handle, else nullptr with the error set.
+KvtTree* BuildTree(KvtHandle file) {
+    int index = -1;
+    KvtTree* tree = KvtFindTree(file, &index);
+    if (tree == nullptr) return nullptr;
+    if (index != 0) {
+        KvtSetError(kKvtErrHandle);
+        return nullptr;
+    }
+    return tree;
 }
 
-std::string Quoted(const std::string& text) {
-    std::string out = "\"";
+// Opens a target (at the top) or a section (below the block open last).
+int OpenBlock(KvtHandle file, const char* name, bool target) {
+    KvtTree* tree = BuildTree(file);
+    if (tree == nullptr) return gKvtError;
+    if (!KvtValidName(name)) return KvtSetError(kKvtErrName);
+    if (target != tree->openPath.empty()) return KvtSetError(kKvtErrBuild);
+    const int parent = target ? 0 : tree->openPath.back();
+    const KvtNodeKind kind = target ? KvtNodeKind::Target : KvtNodeKind::Section;
+    tree->openPath.push_back(KvtAddNode(*tree, parent, kind, name));
+    tree->lastKeyword = -1;
+    return KvtSetError(kKvtOk);
+}
+
+// A new parameter of the keyword added last, or nullptr with the error set.
+KvtNode* AddParam(KvtHandle file, KvtValueKind kind) {
+    KvtTree* tree = BuildTree(file);
+    if (tree == nullptr) return nullptr;
+    if (tree->lastKeyword < 0) {
+        KvtSetError(kKvtErrBuild);
+        return nullptr;
+    }
+    KvtNode& p = tree->nodes[KvtAddNode(*tree, tree->lastKeyword, KvtNodeKind::Param, "")];
+    p.valueKind = kind;
+    KvtSetError(kKvtOk);
+    return &p;
+}
+
+// A text must fit on one line of the file, and a null one is a caller's slip.
+int AddText(KvtHandle file, KvtValueKind kind, const char* value) {
+    if (BuildTree(file) == nullptr) return gKvtError;
+    if (value == nullptr || std::strpbrk(value, "\r\n") != nullptr)
+        return KvtSetError(kKvtErrBuild);
+    KvtNode* p = AddParam(file, kind);
+    if (p != nullptr) p->text = value;
+    return gKvtError;
+}
+
+// ---- writing -----------------------------------------------------------------
+
+void AppendReal(std::string& out, double value, bool single) {
+    if (std::isnan(value)) {
+        out += std::signbit(value) ? "-nan" : "nan";
+        return;
+    }
+    if (std::isinf(value)) {
+        out += value < 0 ? "-inf" : "inf";
+        return;
+    }
+    char buf[48];
+    const auto r =
+        single ? std::to_chars(buf, buf + sizeof buf, static_cast<float>(value),
+                               std::chars_format::general, 9)
+               : std::to_chars(buf, buf + sizeof buf, value, std::chars_format::general, 17);
+    const std::string text(buf, r.ptr);
+    out += text;
+    // "12" would load back as an integer.
+    if (text.find_first_of(".e") == std::string::npos) out += ".0";
+}
+
+void AppendQuoted(std::string& out, const std::string& text) {
+    out += '"';
     for (char c : text) {
         if (c == '"' || c == '\\') out += '\\';
         out += c;
     }
-    return out + "\"";
+    out += '"';
 }
 
-std::string ParamText(const KvtNode& p) {
+void AppendParam(std::string& out, const KvtNode& p) {
     switch (p.valueKind) {
         case KvtValueKind::Integer:
-            return std::to_string(p.integer);
+            out += std::to_string(p.integer);
+            break;
         case KvtValueKind::Real:
-            return RealText(p.real, p.single);
+            AppendReal(out, p.real, p.single);
+            break;
         case KvtValueKind::Logical:
-            return p.logical ? "true" : "false";
+            out += p.logical ? "true" : "false";
+            break;
         case KvtValueKind::Text:
-            return Quoted(p.text);
+            AppendQuoted(out, p.text);
+            break;
         case KvtValueKind::Filename:
-            return "file(" + Quoted(p.text) + ")";
+            out += "file(";
+            AppendQuoted(out, p.text);
+            out += ')';
+            break;
     }
-    return "";
 }
 
-void WriteNode(const KvtTree& tree, int index, int depth, std::string& out) {
-    const KvtNode& node = tree.nodes[index];
-    const std::string indent(4 * static_cast<size_t>(depth), ' ');
-    if (node.kind == KvtNodeKind::Keyword) {
-        out += indent + node.name + " =";
-        for (size_t i = 0; i < node.children.size(); ++i)
-            out += (i == 0 ? " " : ", ") + ParamText(tree.nodes[node.children[i]]);
-        out += "\n";
-        return;
+// The text of the whole tree, walked with a stack of its own (trees nest to
+// any depth). False if a keyword has no parameter: it would not load back.
+bool TreeText(const KvtTree& tree, std::string& out) {
+    struct Step {
+        int node;
+        size_t next;  // the child to write next
+    };
+    std::vector<Step> stack{{0, 0}};
+    while (!stack.empty()) {
+        Step& step = stack.back();
+        const KvtNode& node = tree.nodes[step.node];
+        const size_t depth = stack.size() - 1;  // of the node's children, in levels of indent
+        if (step.next == node.children.size()) {
+            stack.pop_back();
+            if (!stack.empty()) out.append(4 * (depth - 1), ' ') += "}\n";
+            continue;
+        }
+        const int childIndex = node.children[step.next++];
+        const KvtNode& child = tree.nodes[childIndex];
+        if (child.kind == KvtNodeKind::Target && step.next > 1) out += '\n';
+        out.append(4 * depth, ' ') += child.name;
+        if (child.kind == KvtNodeKind::Keyword) {
+            if (child.children.empty()) return false;
+            out += " = ";
+            for (size_t i = 0; i < child.children.size(); ++i) {
+                if (i > 0) out += ", ";
+                AppendParam(out, tree.nodes[child.children[i]]);
+            }
+            out += '\n';
+        } else {
+            out += " {\n";
+            stack.push_back({childIndex, 0});
+        }
     }
-    out += indent + node.name + " {\n";
-    for (int child : node.children) WriteNode(tree, child, depth + 1, out);
-    out += indent + "}\n";
+    return true;
 }
 
 }  // namespace
 
-int kvtWrite(KvtHandle file, const char* path) {
-    int index = -1;
-    KvtTree* tree = KvtFindTree(file, &index);
+KvtHandle kvtCreate(KvtHandle* file) {
+    const KvtHandle handle = KvtMakeHandle(*KvtNewTree(nullptr), 0);
+    if (file != nullptr) *file = handle;
+    KvtSetError(kKvtOk);
+    return handle;
+}
+
+int kvtAddTarget(KvtHandle file, const char* name) {
+    return OpenBlock(file, name, true);
+}
+
+int kvtAddSection(KvtHandle file, const char* name) {
+    return OpenBlock(file, name, false);
+}
+
+int kvtEndSection(KvtHandle file) {
+    KvtTree* tree = BuildTree(file);
     if (tree == nullptr) return gKvtError;
-    if (index != 0) return gKvtError = kKvtErrHandle;
-    std::string out;
-    const std::vector<int>& targets = tree->nodes[0].children;
-    for (size_t i = 0; i < targets.size(); ++i) {
-        if (i > 0) out += "\n";
-        WriteNode(*tree, targets[i], 0, out);
+    if (tree->openPath.empty()) return KvtSetError(kKvtErrBuild);
+    tree->openPath.pop_back();
+    tree->lastKeyword = -1;
+    return KvtSetError(kKvtOk);
+}
+
+int kvtAddKeyword(KvtHandle file, const char* name) {
+    KvtTree* tree = BuildTree(file);
+    if (tree == nullptr) return gKvtError;
+    if (!KvtValidName(name)) return KvtSetError(kKvtErrName);
+    if (tree->openPath.empty()) return KvtSetError(kKvtErrBuild);
+    tree->lastKeyword = KvtAddNode(*tree, tree->openPath.back(), KvtNodeKind::Keyword, name);
+    return KvtSetError(kKvtOk);
+}
+
+int kvtAddInt(KvtHandle file, int32_t value) {
+    if (KvtNode* p = AddParam(file, KvtValueKind::Integer)) p->integer = value;
+    return gKvtError;
+}
+
+int kvtAddFloat(KvtHandle file, float value) {
+    if (KvtNode* p = AddParam(file, KvtValueKind::Real)) {
+        p->real = value;
+        p->single = true;
     }
-    std::ofstream stream(path, std::ios::binary | std::ios::trunc);
-    stream << out;
-    stream.close();
-    return gKvtError = stream ? kKvtOk : kKvtErrFile;
+    return gKvtError;
+}
+
+int kvtAddDouble(KvtHandle file, double value) {
+    if (KvtNode* p = AddParam(file, KvtValueKind::Real)) p->real = value;
+    return gKvtError;
+}
+
+int kvtAddBool(KvtHandle file, bool value) {
+    if (KvtNode* p = AddParam(file, KvtValueKind::Logical)) p->logical = value;
+    return gKvtError;
+}
+
+int kvtAddString(KvtHandle file, const char* value) {
+    return AddText(file, KvtValueKind::Text, value);
+}
+
+int kvtAddFilename(KvtHandle file, const char* value) {
+    return AddText(file, KvtValueKind::Filename, value);
+}
+
+int kvtWrite(KvtHandle file, const char* path) {
+    const KvtTree* tree = BuildTree(file);
+    if (tree == nullptr) return gKvtError;
+    std::string text;
+    if (!TreeText(*tree, text)) return KvtSetError(kKvtErrBuild);
+    if (path == nullptr) return KvtSetError(kKvtErrFile);
+    std::ofstream out(path, std::ios::binary | std::ios::trunc);
+    out << text;
+    out.close();
+    return KvtSetError(out ? kKvtOk : kKvtErrFile);
 }

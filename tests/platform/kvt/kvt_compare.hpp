@@ -1,15 +1,16 @@
 // Compares two parameter trees node by node: structure, names, kinds and
-// values bit for bit (a NaN equals a NaN). Shared by the tests and the fuzzer.
+// values bit for bit (a NaN equals a NaN of the same sign; its payload is not
+// written). Shared by the tests and the fuzzer.
 #pragma once
 
 #include <cmath>
 #include <cstring>
 #include <string>
 
-#include "platform/kvt/kvt_store.hpp"
+#include "platform/kvt/kvt_internal.hpp"
 
 inline bool KvtSameReal(double a, double b) {
-    if (std::isnan(a) && std::isnan(b)) return true;
+    if (std::isnan(a) && std::isnan(b)) return std::signbit(a) == std::signbit(b);
     return std::memcmp(&a, &b, sizeof a) == 0;
 }
 

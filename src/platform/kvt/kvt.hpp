@@ -7,6 +7,7 @@
 //       Section {                 sections nest to any depth
 //           Key = 1, 2.5, true    one keyword a line, one or more parameters
 //           Text = "a \"b\" \\"   text: double quotes, \" and \\ inside
+//                                 (a backslash before anything else is itself)
 //           Data = file("x.nc")   a file name, relative to the file's folder
 //       }
 //   }
@@ -41,7 +42,7 @@ constexpr int kKvtErrBuild = 1008;     // a building call out of order
 // Returns 0 when the file can't be read.
 KvtHandle kvtLoadFile(const char* path, int option, KvtHandle* file);
 // Parses a text as if it were the file at path (path sets the folder that
-// relative file names are resolved against).
+// relative file names are resolved against; null: the working folder).
 KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHandle* file);
 int kvtPeekErrorGlb();
 // The last syntax error: line and column from 1, and a short text of what was

@@ -4,7 +4,8 @@
 // expected. Open targets and sections are kept on a stack of their own, so the
 // depth of nesting is bounded by memory and not by the call stack.
 //
-// Grammar, one statement a line ('}' may close a block behind a statement):
+// Grammar, one statement a line; '}' may close a block behind a statement,
+// and a '}' may be followed by more on its line:
 //   file      = { target }
 //   target    = name '{' { statement } '}'
 //   statement = name '{' { statement } '}' | name '=' value { ',' value }

@@ -130,9 +130,10 @@ TEST(KvtValues, KindsConversionsAndTheErrorCode) {
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
     EXPECT_EQ(kvtGetString(Param(t, "f")), nullptr);
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
+    const KvtHandle f = Param(t, "f");
     EXPECT_EQ(kvtGetFilename(Param(t, "r")), nullptr);
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
-    EXPECT_TRUE(kvtIsFilename(Param(t, "f")));  // a kind query resets it too
+    EXPECT_TRUE(kvtIsFilename(f));  // a kind query resets it too
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtOk);
 
     EXPECT_TRUE(kvtGetBool(Param(t, "b")));

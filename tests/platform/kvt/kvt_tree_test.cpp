@@ -121,15 +121,23 @@ TEST(KvtValues, KindsConversionsAndTheErrorCode) {
     EXPECT_EQ(kvtGetInt(Param(t, "i", 3)), INT_MIN);
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtOk);
 
-    // Every other mismatch is an error, with 0, false or null.
-    EXPECT_FALSE(kvtGetBool(Param(t, "i")));
-    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
-    EXPECT_EQ(kvtGetDouble(Param(t, "b")), 0.0);
-    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
-    EXPECT_EQ(kvtGetInt(Param(t, "s")), 0);
-    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
-    EXPECT_EQ(kvtGetString(Param(t, "f")), nullptr);
-    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);
+    // Every other mismatch is an error, with 0, false or null. (A braced list
+    // is evaluated in order: each code is read right after its call.)
+    const struct {
+        bool zero;
+        int error;
+        const char* what;
+    } mismatches[] = {
+        {!kvtGetBool(Param(t, "i")), kvtPeekErrorGlb(), "logical of an integer"},
+        {kvtGetDouble(Param(t, "b")) == 0.0, kvtPeekErrorGlb(), "real of a logical"},
+        {kvtGetInt(Param(t, "s")) == 0, kvtPeekErrorGlb(), "integer of a text"},
+        {kvtGetString(Param(t, "f")) == nullptr, kvtPeekErrorGlb(), "text of a file name"},
+        {kvtGetFilename(Param(t, "r")) == nullptr, kvtPeekErrorGlb(), "file name of a real"},
+    };
+    for (const auto& m : mismatches) {
+        EXPECT_TRUE(m.zero) << m.what;
+        EXPECT_EQ(m.error, kKvtErrKind) << m.what;
+    }
     const KvtHandle f = Param(t, "f");
     EXPECT_EQ(kvtGetFilename(Param(t, "r")), nullptr);
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrKind);

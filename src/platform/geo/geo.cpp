@@ -4,6 +4,7 @@
 
 #include <cctype>
 #include <cmath>
+#include <cstdlib>
 #include <map>
 #include <memory>
 
@@ -14,11 +15,18 @@ constexpr double kDegree = 3.14159265358979323846 / 180.0;
 struct Frame {
     std::string projection;
     bool none = false;
-    PJ* transform = nullptr;  // geographic (lon, lat) to projected (east, north)
-    PJ* crs = nullptr;
+    PJ* crs = nullptr;         // the CRS as given (may carry a height or a datum shift)
+    PJ* horizontal = nullptr;  // its projected part: the map projection itself
+    PJ* transform = nullptr;   // geographic (lon, lat on WGS 84) to projected (east, north)
+    PJ* toBase = nullptr;      // projected to lon, lat on the projection's own datum
     double longitude = 0.0, latitude = 0.0, orientation = 0.0;
     double east0 = 0.0, north0 = 0.0;  // the origin, projected
 };
+
+void Release(Frame& f) {
+    for (PJ* p : {f.crs, f.horizontal, f.transform, f.toBase}) proj_destroy(p);
+    f.crs = f.horizontal = f.transform = f.toBase = nullptr;
+}
 
 PJ_CONTEXT* Context() {
     static PJ_CONTEXT* context = [] {
@@ -83,6 +91,48 @@ int Inverse(const Frame& f, double east, double north, double& lon, double& lat)
     return 0;
 }
 
+PJ* Normalized(PJ* operation) {
+    PJ* normal = operation ? proj_normalize_for_visualization(Context(), operation) : nullptr;
+    proj_destroy(operation);
+    return normal;
+}
+
+// The CRS of the text, its projected part and the two transformations a frame
+// needs. A grid in metres lies only on a map projection: a geographic CRS
+// ("EPSG:4326") is refused, "LONG/LAT" being the way to say none.
+int MakeProjection(Frame& f, const std::string& text) {
+    f.crs = proj_create(Context(), text.c_str());
+    if (f.crs == nullptr) return Fail(kGeoErrProjection, "unknown projection: " + text);
+    PJ* h = proj_clone(Context(), f.crs);
+    for (;;) {
+        PJ* inner = nullptr;
+        const PJ_TYPE type = proj_get_type(h);
+        if (type == PJ_TYPE_BOUND_CRS)  // a CRS with its shift to WGS 84: the CRS itself
+            inner = proj_get_source_crs(Context(), h);
+        else if (type == PJ_TYPE_COMPOUND_CRS)  // horizontal plus height: the horizontal one
+            inner = proj_crs_get_sub_crs(Context(), h, 0);
+        if (inner == nullptr) break;
+        proj_destroy(h);
+        h = inner;
+    }
+    f.horizontal = h;
+    const PJ_TYPE type = proj_get_type(h);
+    if (type == PJ_TYPE_GEOGRAPHIC_2D_CRS || type == PJ_TYPE_GEOGRAPHIC_3D_CRS)
+        return Fail(kGeoErrProjection, text + " is geographic, not a map projection");
+    if (type != PJ_TYPE_PROJECTED_CRS)
+        return Fail(kGeoErrProjection, text + " is not a map projection");
+    PJ* wgs84 = proj_create(Context(), "EPSG:4326");
+    f.transform =
+        Normalized(proj_create_crs_to_crs_from_pj(Context(), wgs84, f.crs, nullptr, nullptr));
+    proj_destroy(wgs84);
+    PJ* base = proj_crs_get_geodetic_crs(Context(), h);
+    f.toBase = Normalized(proj_create_crs_to_crs_from_pj(Context(), h, base, nullptr, nullptr));
+    proj_destroy(base);
+    if (f.transform == nullptr || f.toBase == nullptr)
+        return Fail(kGeoErrProjection, "no transformation to " + text);
+    return 0;
+}
+
 }  // namespace
 
 bool GeoIsNone(const std::string& projection) {
@@ -99,6 +149,9 @@ std::string GeoCrsText(const std::string& projection) {
         if (end != p.c_str() + 4 && *end == '\0' && zone >= 1 && zone <= 60)
             return "EPSG:" + std::to_string(32600 + zone);
     }
+    // A PROJ string without "+type=crs" would be read as a bare conversion,
+    // which has no datum and no WKT of a CRS.
+    if (p.rfind('+', 0) == 0 && p.find("+type=crs") == std::string::npos) return p + " +type=crs";
     return p;
 }
 
@@ -116,20 +169,13 @@ int GeoOpen(GeoHandle* handle, const std::string& projection, double longitude, 
     f->none = GeoIsNone(projection);
     f->orientation = f->none ? 0.0 : orientation;
     if (!f->none) {
-        const std::string crs = GeoCrsText(projection);
-        f->crs = proj_create(Context(), crs.c_str());
-        if (f->crs == nullptr) return Fail(kGeoErrProjection, "unknown projection: " + crs);
-        PJ* raw = proj_create_crs_to_crs(Context(), "EPSG:4326", crs.c_str(), nullptr);
-        f->transform = raw ? proj_normalize_for_visualization(Context(), raw) : nullptr;
-        proj_destroy(raw);
-        if (f->transform == nullptr) {
-            proj_destroy(f->crs);
-            return Fail(kGeoErrProjection, "no transformation to " + crs);
+        if (int code = MakeProjection(*f, GeoCrsText(projection))) {
+            Release(*f);
+            return code;
         }
     }
     if (int code = Forward(*f, longitude, latitude, f->east0, f->north0)) {
-        proj_destroy(f->transform);
-        proj_destroy(f->crs);
+        Release(*f);
         return code;
     }
     *handle = gNext++;
@@ -140,8 +186,7 @@ int GeoOpen(GeoHandle* handle, const std::string& projection, double longitude, 
 void GeoClose(GeoHandle handle) {
     Frame* f = Find(handle);
     if (f == nullptr) return;
-    proj_destroy(f->transform);
-    proj_destroy(f->crs);
+    Release(*f);
     gFrames.erase(handle);
 }
 
@@ -199,14 +244,19 @@ int GeoTrueNorth(GeoHandle h, double x, double y, double& degrees) {
     if (f == nullptr) return Fail(kGeoErrHandle, "not a frame");
     double convergence = 0.0;
     if (!f->none) {
-        double lon = 0, lat = 0;
-        if (int code = GeoXy2Geo(h, x, y, lon, lat)) return code;
+        double east = 0, north = 0;
+        GeoXy2Proj(h, x, y, east, north);
+        // The factors of a projection are taken at the point's longitude and
+        // latitude on the projection's own datum, not on WGS 84.
+        PJ_COORD c = proj_trans(f->toBase, PJ_FWD, proj_coord(east, north, 0, 0));
+        if (!std::isfinite(c.lp.lam) || !std::isfinite(c.lp.phi))
+            return Fail(kGeoErrTransform, "the point can't be unprojected");
         // PROJ's meridian convergence: the angle from true north to projection
         // north, positive where projection north lies east of true north.
-        PJ_COORD c = proj_coord(proj_torad(lon), proj_torad(lat), 0, 0);
-        const PJ_FACTORS factors = proj_factors(f->crs, c);
-        if (proj_errno(f->crs) != 0) {
-            proj_errno_reset(f->crs);
+        const PJ_FACTORS factors = proj_factors(
+            f->horizontal, proj_coord(proj_torad(c.lp.lam), proj_torad(c.lp.phi), 0, 0));
+        if (proj_errno(f->horizontal) != 0) {
+            proj_errno_reset(f->horizontal);
             return Fail(kGeoErrTransform, "no meridian convergence at the point");
         }
         convergence = factors.meridian_convergence / kDegree;
@@ -225,8 +275,9 @@ int GeoProjectionString(GeoHandle h, std::string& text) {
 int GeoProjectionName(GeoHandle h, std::string& name) {
     const Frame* f = Find(h);
     if (f == nullptr) return Fail(kGeoErrHandle, "not a frame");
+    // A CRS made from a PROJ string is called "unknown": its text says more.
     const char* n = f->none ? nullptr : proj_get_name(f->crs);
-    name = n ? n : f->projection;
+    name = n && std::string(n) != "unknown" ? n : f->projection;
     return 0;
 }
 
@@ -250,7 +301,9 @@ bool GeoIdentical(const std::string& a, const std::string& b) {
     if (GeoIsNone(a) || GeoIsNone(b)) return Upper(Trimmed(a)) == Upper(Trimmed(b));
     PJ* pa = proj_create(Context(), GeoCrsText(a).c_str());
     PJ* pb = proj_create(Context(), GeoCrsText(b).c_str());
-    const bool same = pa && pb && proj_is_equivalent_to(pa, pb, PJ_COMP_EQUIVALENT);
+    const bool same = pa && pb &&
+                      proj_is_equivalent_to_with_ctx(Context(), pa, pb,
+                                                     PJ_COMP_EQUIVALENT_EXCEPT_AXIS_ORDER_GEOGCRS);
     proj_destroy(pa);
     proj_destroy(pb);
     return same;

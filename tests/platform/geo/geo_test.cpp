@@ -5,22 +5,49 @@
 #include <cmath>
 #include <cstdio>
 #include <sstream>
+#include <tuple>
+#include <utility>
+#include <vector>
 
 #include "support/test_support.hpp"
 
 namespace {
 
-// Projects a point with the cs2cs program of the PROJ tools, longitude first.
-bool Cs2cs(const std::string& crs, double lon, double lat, double& east, double& north) {
+// Transforms points with the cs2cs program of the PROJ tools: the two
+// coordinates of each in the order the source CRS wants them, the two results
+// in the order of the target CRS.
+std::vector<std::pair<double, double>> Cs2cs(const std::string& crsPair,
+                                             const std::vector<std::pair<double, double>>& in) {
     bwtest::TempDir dir;
-    char input[64];
-    std::snprintf(input, sizeof input, "%.10f %.10f\n", lon, lat);
+    std::string input;
+    for (const auto& [a, b] : in) {
+        char line[64];
+        std::snprintf(line, sizeof line, "%.10f %.10f\n", a, b);
+        input += line;
+    }
     bwtest::WriteFile(dir / "in.txt", input);
-    auto r = bwtest::RunProgram(
-        {"/bin/sh", "-c", "cs2cs -f %.6f +proj=longlat +datum=WGS84 +to " + crs + " < in.txt"},
-        dir.path.string());
-    std::istringstream out(r.out);
-    return r.exitCode == 0 && static_cast<bool>(out >> east >> north);
+    auto r = bwtest::RunProgram({"/bin/sh", "-c", "cs2cs -f %.6f " + crsPair + " < in.txt"},
+                                dir.path.string());
+    std::vector<std::pair<double, double>> out;
+    std::istringstream lines(r.out);
+    std::string line;
+    while (r.exitCode == 0 && std::getline(lines, line)) {
+        std::istringstream fields(line);
+        double a = 0, b = 0;
+        if (fields >> a >> b) out.emplace_back(a, b);
+    }
+    return out;
+}
+
+bool Cs2cs(const std::string& crsPair, double a, double b, double& out1, double& out2) {
+    const auto out = Cs2cs(crsPair, {{a, b}});
+    if (out.size() != 1) return false;
+    std::tie(out1, out2) = out[0];
+    return true;
+}
+
+bool Cs2csFromWgs84(const std::string& crs, double lon, double lat, double& east, double& north) {
+    return Cs2cs("+proj=longlat +datum=WGS84 +to " + crs, lon, lat, east, north);
 }
 
 TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
@@ -40,7 +67,7 @@ TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
         for (double dlon : {0.0, 0.05, -0.2}) {
             double e1 = 0, n1 = 0, e2 = 0, n2 = 0;
             ASSERT_EQ(GeoGeo2Proj(frame, c.lon + dlon, c.lat - dlon, e1, n1), 0);
-            ASSERT_TRUE(Cs2cs(c.crs, c.lon + dlon, c.lat - dlon, e2, n2)) << c.crs;
+            ASSERT_TRUE(Cs2csFromWgs84(c.crs, c.lon + dlon, c.lat - dlon, e2, n2)) << c.crs;
             EXPECT_NEAR(e1, e2, 1e-5) << c.projection;  // cs2cs prints micrometres
             EXPECT_NEAR(n1, n2, 1e-5) << c.projection;
             double lon = 0, lat = 0;
@@ -73,16 +100,61 @@ TEST(MapFrame, ModelCoordinatesTurnWithTheGrid) {
     double north = 0;
     GeoProjectionNorth(frame, north);
     EXPECT_EQ(north, -30.0);
-
-    // True north, checked against the direction of a short step due north.
-    for (double plon : {9.0, 11.5, 6.5}) {
-        GeoGeo2Xy(frame, plon, 54.0, x, y);
-        double x2 = 0, y2 = 0, degrees = 0;
-        GeoGeo2Xy(frame, plon, 54.0001, x2, y2);
-        ASSERT_EQ(GeoTrueNorth(frame, x, y, degrees), 0);
-        EXPECT_NEAR(degrees, std::atan2(x2 - x, y2 - y) * 180.0 / M_PI, 1e-3) << plon;
-    }
     GeoClose(frame);
+}
+
+// True north at a point, against cs2cs: a short step due north on the
+// projection's own datum, projected, gives the direction of the meridian on
+// the map. Cases: a turned grid, a datum other than WGS 84, a CRS with a
+// height, a PROJ string with a datum shift, a point far from the central
+// meridian. (North on a shifted datum differs from that of WGS 84 by a few
+// arcseconds; the frame takes the projection's own.)
+TEST(MapFrame, TrueNorthFollowsTheMeridianConvergence) {
+    const struct {
+        const char* projection;
+        const char* cs2cs;  // from the projection's geographic CRS to the projection
+        bool latFirst;      // the geographic CRS wants latitude first
+        double lon, lat, orientation;
+    } cases[] = {
+        {"UTM-32", "+proj=longlat +datum=WGS84 +to EPSG:32632", false, 9.5, 54.25, 30.0},
+        {"EPSG:27700", "EPSG:4277 EPSG:27700", true, -1.5, 53.0, -12.0},
+        {"EPSG:25832+5783", "EPSG:4258 EPSG:25832", true, 8.0, 50.0, 0.0},
+        {"+proj=utm +zone=32 +ellps=intl +towgs84=-87,-98,-121",
+         "+proj=longlat +ellps=intl +type=crs +to +proj=utm +zone=32 +ellps=intl +type=crs", false,
+         10.0, 56.0, 5.0},
+        {"+proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84",
+         "+proj=longlat +datum=WGS84 +to +proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84",
+         false, 7.0, 51.0, 0.0},
+    };
+    for (const auto& c : cases) {
+        GeoHandle frame = 0;
+        ASSERT_EQ(GeoOpen(&frame, c.projection, c.lon, c.lat, c.orientation), 0)
+            << c.projection << ": " << GeoLastError();
+        for (double plon : {c.lon - 1.5, c.lon + 2.0}) {
+            // The point and steps of 0.001 degrees north and south of it.
+            std::vector<std::pair<double, double>> points;
+            for (double dlat : {0.0, 1e-3, -1e-3})
+                points.emplace_back(c.latFirst ? std::make_pair(c.lat + dlat, plon)
+                                               : std::make_pair(plon, c.lat + dlat));
+            const auto p = Cs2cs(c.cs2cs, points);
+            ASSERT_EQ(p.size(), 3u) << c.cs2cs;
+            // The meridian's direction on the map, then on the grid turned by the orientation.
+            const double expected =
+                std::atan2(p[1].first - p[2].first, p[1].second - p[2].second) * 180.0 / M_PI -
+                c.orientation;
+            double x = 0, y = 0, degrees = 0;
+            GeoProj2Xy(frame, p[0].first, p[0].second, x, y);
+            ASSERT_EQ(GeoTrueNorth(frame, x, y, degrees), 0) << c.projection;
+            EXPECT_NEAR(degrees, expected, 1e-6) << c.projection << " at " << plon;
+        }
+        // Whatever the text, the data files get the WKT of a CRS, not of a bare conversion.
+        std::string wkt;
+        GeoCrsWkt(frame, wkt);
+        EXPECT_TRUE(wkt.rfind("PROJCRS[", 0) == 0 || wkt.rfind("COMPOUNDCRS[", 0) == 0 ||
+                    wkt.rfind("BOUNDCRS[", 0) == 0)
+            << c.projection << ": " << wkt.substr(0, 40);
+        GeoClose(frame);
+    }
 }
 
 TEST(MapFrame, NoProjectionPassesCoordinatesAndTextsAreChecked) {
@@ -104,6 +176,9 @@ TEST(MapFrame, NoProjectionPassesCoordinatesAndTextsAreChecked) {
 
     EXPECT_EQ(GeoOpen(&frame, "UTM-61", 0, 0, 0), kGeoErrProjection);
     EXPECT_EQ(GeoOpen(&frame, "no such thing", 0, 0, 0), kGeoErrProjection);
+    // A grid in metres can't lie on longitude and latitude under a CRS's name.
+    EXPECT_EQ(GeoOpen(&frame, "EPSG:4326", 0, 0, 0), kGeoErrProjection);
+    EXPECT_EQ(GeoOpen(&frame, "+proj=longlat +datum=WGS84", 0, 0, 0), kGeoErrProjection);
     EXPECT_EQ(GeoXy2Geo(12345, 0, 0, e, n), kGeoErrHandle);
 
     ASSERT_EQ(GeoOpen(&frame, "UTM-32", 9.0, 54.0, 0.0), 0);
@@ -114,6 +189,7 @@ TEST(MapFrame, NoProjectionPassesCoordinatesAndTextsAreChecked) {
     EXPECT_EQ(name, "WGS 84 / UTM zone 32N");
     GeoClose(frame);
     EXPECT_TRUE(GeoIdentical("UTM-32", "EPSG:32632"));
+    EXPECT_TRUE(GeoIdentical("UTM-32", "+proj=utm +zone=32 +datum=WGS84"));
     EXPECT_FALSE(GeoIdentical("UTM-32", "UTM-33"));
     EXPECT_TRUE(GeoIdentical("LONG/LAT", "long/lat"));
 }

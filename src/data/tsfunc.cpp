@@ -2,19 +2,27 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <new>
 #include <string>
 
 #include "run/messages.hpp"
+#include "run/process.hpp"
 
 TsState gTs;
 
 namespace {
 
-// A scratch file in the system's temporary folder. Its name is removed at
-// once, so the file vanishes with the process however the process ends, and
-// processes under a launcher never share one.
-FILE* OpenScratch() {
-    std::string name = (std::filesystem::temp_directory_path() / "bw_series_XXXXXX").string();
+// A scratch file in the system's temporary folder, named for this process
+// (its number under a launcher) and made unique by mkstemp. The name is
+// removed at once: the open file vanishes with the process however the
+// process ends (a stop, a signal, even SIGKILL), which no cleanup routine
+// could promise, and nothing is left for others to trip over.
+FILE* OpenScratch(const char* which) {
+    const std::string stem = ProcessFileStem(std::string("bw_series_") + which);
+    std::error_code error;
+    const std::filesystem::path folder = std::filesystem::temp_directory_path(error);
+    if (error) StopRun("tsfunc: Unable to open scratch file");
+    std::string name = (folder / (stem + "_XXXXXX")).string();
     const int fd = mkstemp(name.data());
     if (fd < 0) StopRun("tsfunc: Unable to open scratch file");
     std::remove(name.c_str());
@@ -33,6 +41,19 @@ void WriteRecord(FILE* file, const float* values, size_t count) {
         StopRun("tsfunc: Unable to write scratch file");
 }
 
+// A full disk shows only when the buffer goes out.
+void Flush(FILE* file) {
+    if (std::fflush(file) != 0) StopRun("tsfunc: Unable to write scratch file");
+}
+
+void Allocate(std::vector<float>& row, size_t count) {
+    try {
+        row.assign(count, 0.0f);
+    } catch (const std::bad_alloc&) {
+        StopRun("tsfunc: Unable to allocate memory");
+    }
+}
+
 void ReadRecord(FILE* file, float* values, size_t count) {
     if (std::fread(values, sizeof(float), count, file) != count)
         StopRun("tsfunc: Unable to read scratch file");
@@ -48,15 +69,17 @@ void TsAddSeries(int32_t& id, const float* values) {
     if (gTs.tsPosition != -1) StopRun("tsfunc: Reading has already started");
     const size_t columns = static_cast<size_t>(gTs.tsNextId);
     std::vector<float> row;
-    row.resize(columns);
+    Allocate(row, columns);
 
     if (gTs.tsNextId == 1) {
-        gTs.tsFileA = OpenScratch();
+        // One record of one value for each step: the series as it stands.
+        gTs.tsFileA = OpenScratch("A");
         WriteRecord(gTs.tsFileA, values, static_cast<size_t>(gTs.tsSteps));
+        Flush(gTs.tsFileA);
     } else {
         // An even id moves the store from A to B, an odd one back from B to A.
         const bool even = gTs.tsNextId % 2 == 0;
-        if (even && gTs.tsFileB == nullptr) gTs.tsFileB = OpenScratch();
+        if (even && gTs.tsFileB == nullptr) gTs.tsFileB = OpenScratch("B");
         FILE* source = even ? gTs.tsFileA : gTs.tsFileB;
         FILE* target = even ? gTs.tsFileB : gTs.tsFileA;
         std::rewind(source);
@@ -66,9 +89,8 @@ void TsAddSeries(int32_t& id, const float* values) {
             row[columns - 1] = values[s];
             WriteRecord(target, row.data(), columns);
         }
-        std::fflush(target);
+        Flush(target);
     }
-    std::fflush(gTs.tsFileA);
     id = gTs.tsNextId++;
 }
 
@@ -76,7 +98,7 @@ void TsReadStep(int32_t step) {
     if (gTs.tsNextId == 1) return;
     const size_t columns = static_cast<size_t>(gTs.tsNextId - 1);
     if (gTs.tsPosition == -1) {
-        gTs.tsRow.assign(columns, 0.0f);
+        Allocate(gTs.tsRow, columns);
         if (gTs.tsNextId % 2 == 0) {
             Close(gTs.tsFileB);
             gTs.tsFile = gTs.tsFileA;
@@ -97,7 +119,10 @@ void TsReadStep(int32_t step) {
 }
 
 float TsValue(int32_t id) {
-    if (id > 0 && id < gTs.tsNextId) return gTs.tsRow[static_cast<size_t>(id - 1)];
+    // Before the first row is read no value may be asked for; should one be,
+    // it gets the no-value rather than memory that isn't there.
+    if (id > 0 && id < gTs.tsNextId && static_cast<size_t>(id) <= gTs.tsRow.size())
+        return gTs.tsRow[static_cast<size_t>(id - 1)];
     return kTsNoValue;
 }
 

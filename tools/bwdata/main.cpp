@@ -1,5 +1,8 @@
 // bwdata: makes data files for bw from plain text and gets results out as text.
 #include <algorithm>
+#include <cerrno>
+#include <climits>
+#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -30,16 +33,36 @@ int Fail(const std::string& text) {
     return 1;
 }
 
+bool Integer(const std::string& text, int& out) {
+    char* end = nullptr;
+    errno = 0;
+    const long v = std::strtol(text.c_str(), &end, 10);
+    if (end == text.c_str() || *end != '\0' || errno != 0 || v < INT_MIN || v > INT_MAX)
+        return false;
+    out = static_cast<int>(v);
+    return true;
+}
+
 bool Integers(const std::string& text, std::vector<int>& out) {
     std::istringstream in(text);
     std::string field;
     while (std::getline(in, field, ',')) {
-        char* end = nullptr;
-        const long v = std::strtol(field.c_str(), &end, 10);
-        if (end == field.c_str() || *end != '\0') return false;
-        out.push_back(static_cast<int>(v));
+        int v = 0;
+        if (!Integer(field, v)) return false;
+        out.push_back(v);
     }
     return !out.empty();
+}
+
+// Longitude, latitude and orientation of a file, or "none" without a projection.
+void PrintProjection(const XolFile& f) {
+    if (f.projection.empty()) {
+        std::printf("  Projection: none\n");
+        return;
+    }
+    std::printf("  Projection: %s (longitude %s, latitude %s, orientation %s)\n",
+                f.projection.c_str(), NumberText(f.longitude).c_str(),
+                NumberText(f.latitude).c_str(), NumberText(f.orientation).c_str());
 }
 
 }  // namespace
@@ -50,6 +73,9 @@ int main(int argc, char** argv) {
         return argc < 3 && !(argc == 2 && std::strcmp(argv[1], "--help") == 0) ? 2 : 0;
     }
     const std::string command = argv[1], input = argv[2];
+    if (command != "info" && command != "import-asc" && command != "import-csv" &&
+        command != "export")
+        return Fail("unknown command " + command + "\n" + kUsage);
     std::string output, start, text;
     AscOptions asc;
     CsvOptions csv;
@@ -68,9 +94,11 @@ int main(int argc, char** argv) {
             if (std::sscanf(value.c_str(), "%lf,%lf", &asc.longitude, &asc.latitude) != 2)
                 return Fail("--origin needs LON,LAT");
             asc.originGiven = true;
-        } else if (arg == "--orientation")
+        } else if (arg == "--orientation") {
             asc.orientation = std::strtod(value.c_str(), &end);
-        else if (arg == "--name")
+            if (end == value.c_str() || *end != '\0' || !std::isfinite(asc.orientation))
+                return Fail("--orientation needs degrees");
+        } else if (arg == "--name")
             asc.name = csv.name = value;
         else if (arg == "--title")
             asc.title = csv.title = value;
@@ -87,13 +115,13 @@ int main(int argc, char** argv) {
         else if (arg == "--dx") {
             csv.line = true;
             csv.dx = std::strtof(value.c_str(), &end);
-            if (end == value.c_str() || csv.dx <= 0.0f)
+            if (end == value.c_str() || *end != '\0' || !(csv.dx > 0.0f) || std::isinf(csv.dx))
                 return Fail("--dx needs a positive spacing");
-        } else if (arg == "--item")
-            item = std::atoi(value.c_str());
-        else if (arg == "--step")
-            step = std::atoi(value.c_str());
-        else
+        } else if (arg == "--item") {
+            if (!Integer(value, item) || item < 1) return Fail("--item needs a number from 1");
+        } else if (arg == "--step") {
+            if (!Integer(value, step) || step < 0) return Fail("--step needs a number from 0");
+        } else
             return Fail("unknown option " + arg);
     }
     if (command == "info") {
@@ -123,10 +151,7 @@ int main(int argc, char** argv) {
                 }
             }
         XolPrintSummary(f);  // no log is open: the summary goes to standard output
-        std::printf("  Projection: %s (longitude %s, latitude %s, orientation %s)\n",
-                    f.projection.empty() ? "none" : f.projection.c_str(),
-                    NumberText(f.longitude).c_str(), NumberText(f.latitude).c_str(),
-                    NumberText(f.orientation).c_str());
+        PrintProjection(f);
         XolClose(f);
         return 0;
     }
@@ -136,10 +161,8 @@ int main(int argc, char** argv) {
     else if (command == "import-csv") {
         if (csv.start.empty()) return Fail("--start \"YYYY-MM-DD hh:mm:ss\" is missing");
         text = ImportCsv(input, output, csv);
-    } else if (command == "export")
+    } else
         text = ExportText(input, output, item, step);
-    else
-        return Fail("unknown command " + command + "\n" + kUsage);
     if (!text.empty()) return Fail(text);
     std::printf("%s written\n", output.c_str());
     return 0;

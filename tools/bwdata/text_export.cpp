@@ -1,11 +1,14 @@
 // Data files into plain text: series and lines as CSV, a map at one step as
 // an ESRI ASCII grid or as the columns j,k,value.
+#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <sstream>
 
 #include "bwdata/bwdata.hpp"
+#include "data/geoframe.hpp"
 #include "data/xolfile.hpp"
+#include "platform/qty/qty.hpp"
 
 namespace {
 
@@ -18,6 +21,39 @@ std::string Value(float v, float deleteValue) {
         if (std::strtof(text, nullptr) == v) break;
     }
     return text;
+}
+
+// A 64-bit value (a time, a coordinate) to the micro-unit, without trailing zeros.
+std::string Fixed(double v) {
+    char text[48];
+    std::snprintf(text, sizeof text, "%.6f", v);
+    std::string s = text;
+    s.erase(s.find_last_not_of('0') + 1);
+    if (s.back() == '.') s.pop_back();
+    return s == "-0" ? "0" : s;
+}
+
+// Where the centre of the grid's lower-left cell lies on the map: the axis
+// origins in model coordinates, moved to the projection by the file's frame.
+// An ASCII grid can't be turned, so a turned grid has no such place.
+std::string LowerLeftCentre(const XolFile& f, double& x, double& y) {
+    x = f.axes[0].origin;
+    y = f.axes[1].origin;
+    if (f.projection.empty()) return "";
+    GeoHandle frame = 0;
+    int status = 0;
+    GeoFrameOpen(frame, f.projection, f.longitude, f.latitude, f.orientation, &status);
+    if (status != 0) return "the file's projection " + f.projection + " is not understood";
+    double north = 0.0;
+    GeoFrameGetProjectionNorth(frame, north, &status);
+    if (north != 0.0) {
+        GeoClose(frame);
+        return "the grid is turned " + Fixed(-north) +
+               " degrees on its map, which an ASCII grid can't hold: export it as .csv";
+    }
+    GeoFrameXy2Proj(frame, x, y, x, y, &status);
+    GeoClose(frame);
+    return status == 0 ? "" : "the grid's origin can't be placed on its map";
 }
 
 bool EndsWith(const std::string& text, const std::string& end) {
@@ -49,7 +85,11 @@ std::string ExportText(const std::string& input, const std::string& output, int 
     }
     std::ostringstream out;
     std::vector<float> values(points);
-    const double seconds = f.timeStep;  // steps are in seconds in the files the engine writes
+    double seconds = f.timeStep;
+    if (f.timeUnit != 1400 && !qtyConvertUnit(f.timeUnit, 1400, seconds)) {
+        XolClose(f);
+        return input + ": the time unit " + std::to_string(f.timeUnit) + " is not a time";
+    }
     if (f.dimension < 2) {
         if (!EndsWith(output, ".csv")) {
             XolClose(f);
@@ -64,9 +104,9 @@ std::string ExportText(const std::string& input, const std::string& output, int 
                     << Value(f.axes[0].origin + static_cast<float>(p) * f.axes[0].spacing, 1e30f);
         }
         out << "\n";
-        for (int s = 0; s < steps; ++s) {
-            out << Value(static_cast<float>(s * seconds), 1e30f);
-            for (int n = 1; n <= items; ++n) {
+        for (int s = 0; s < steps && status == 0; ++s) {
+            out << Fixed(s * seconds);
+            for (int n = 1; n <= items && status == 0; ++n) {
                 const bool wanted = f.dimension == 0 || n == item;
                 if (!wanted) {
                     XolSkipDynamic(f, &status);
@@ -100,10 +140,14 @@ std::string ExportText(const std::string& input, const std::string& output, int 
                        Value(f.axes[0].spacing, 1e30f) + " and dy " +
                        Value(f.axes[1].spacing, 1e30f);
             }
-            out << "ncols " << nx << "\nnrows " << ny << "\nxllcenter "
-                << Value(f.axes[0].origin, 1e30f) << "\nyllcenter "
-                << Value(f.axes[1].origin, 1e30f) << "\ncellsize "
-                << Value(f.axes[0].spacing, 1e30f) << "\nNODATA_value -9999\n";
+            double x0 = 0, y0 = 0;
+            if (std::string e = LowerLeftCentre(f, x0, y0); !e.empty()) {
+                XolClose(f);
+                return input + ": " + e;
+            }
+            out << "ncols " << nx << "\nnrows " << ny << "\nxllcenter " << Fixed(x0)
+                << "\nyllcenter " << Fixed(y0) << "\ncellsize " << Value(f.axes[0].spacing, 1e30f)
+                << "\nNODATA_value -9999\n";
             for (int k = ny - 1; k >= 0; --k) {  // the northernmost row first
                 for (int j = 0; j < nx; ++j) {
                     const float v = values[static_cast<size_t>(k) * nx + j];

@@ -1,7 +1,7 @@
 // Plain text into data files: ESRI ASCII grids into maps, CSV tables into
 // series and line files. The whole input is read and checked before a file
 // is written, so that bad input leaves nothing behind.
-#include <cerrno>
+#include <cfloat>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
@@ -16,14 +16,21 @@
 
 namespace {
 
+// A finite number and nothing else ("nan" and "inf" are no numbers here).
 bool Number(const std::string& text, double& value) {
     const char* begin = text.c_str();
     while (*begin == ' ' || *begin == '\t') ++begin;
     char* end = nullptr;
-    errno = 0;
     value = std::strtod(begin, &end);
     while (end && (*end == ' ' || *end == '\t' || *end == '\r')) ++end;
-    return end != begin && end && *end == '\0' && errno == 0;
+    return end != begin && end && *end == '\0' && std::isfinite(value);
+}
+
+// What is wrong with a value of a 32-bit file: empty when nothing.
+std::string BadValue(const std::string& token, double& value) {
+    if (!Number(token, value)) return "'" + token + "' is not a number";
+    if (std::fabs(value) > FLT_MAX) return "'" + token + "' is too large for a 32-bit value";
+    return "";
 }
 
 std::vector<std::string> Split(const std::string& line, char separator) {
@@ -103,7 +110,13 @@ std::string ImportAsc(const std::string& input, const std::string& output,
         double value = 0;
         std::string lower = key;
         for (char& c : lower) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-        if (std::isalpha(static_cast<unsigned char>(key[0]))) {
+        const bool headerKey = lower == "ncols" || lower == "nrows" || lower == "xllcorner" ||
+                               lower == "xllcenter" || lower == "yllcorner" ||
+                               lower == "yllcenter" || lower == "cellsize" ||
+                               lower == "nodata_value";
+        if (headerKey && !rows.empty())
+            return Where(input, lineNo) + "the header key '" + key + "' comes after the data";
+        if (headerKey) {
             std::string rest;
             fields >> rest;
             if (!Number(rest, value)) return Where(input, lineNo) + "'" + key + "' needs a number";
@@ -117,20 +130,21 @@ std::string ImportAsc(const std::string& input, const std::string& output,
                 y0 = value;
             else if (lower == "cellsize")
                 cell = value, cellGiven = true;
-            else if (lower == "nodata_value")
-                nodata = value;
             else
-                return Where(input, lineNo) + "unknown header key '" + key + "'";
+                nodata = value;
             continue;
         }
+        if (rows.empty() && std::isalpha(static_cast<unsigned char>(key[0])))
+            return Where(input, lineNo) + "unknown header key '" + key + "'";
         if (ncols <= 0 || nrows <= 0 || !cellGiven || cell <= 0)
             return Where(input, lineNo) + "the header needs ncols, nrows and a positive cellsize";
+        if (static_cast<long>(rows.size()) == ncols * nrows)
+            return Where(input, lineNo) + "more rows than nrows " + std::to_string(nrows);
         std::istringstream values(line);
         std::string token;
         long count = 0;
         while (values >> token) {
-            if (!Number(token, value))
-                return Where(input, lineNo) + "'" + token + "' is not a number";
+            if (std::string e = BadValue(token, value); !e.empty()) return Where(input, lineNo) + e;
             rows.push_back(value == nodata ? kDeleteValue : static_cast<float>(value));
             ++count;
         }
@@ -202,7 +216,11 @@ std::string ImportCsv(const std::string& input, const std::string& output,
         const auto fields = Split(line, ',');
         double t = 0;
         if (times.empty() && names.empty() && !Number(fields[0], t)) {
-            for (size_t i = 1; i < fields.size(); ++i) names.push_back(Trimmed(fields[i]));
+            for (size_t i = 1; i < fields.size(); ++i) {
+                names.push_back(Trimmed(fields[i]));
+                if (names.back().empty() && !options.line)
+                    return Where(input, lineNo) + "item " + std::to_string(i) + " has no name";
+            }
             continue;
         }
         if (!Number(fields[0], t))
@@ -215,11 +233,16 @@ std::string ImportCsv(const std::string& input, const std::string& output,
             double v = 0;
             if (Trimmed(fields[i]).empty())
                 v = kDeleteValue;
-            else if (!Number(fields[i], v))
-                return Where(input, lineNo) + "'" + Trimmed(fields[i]) + "' is not a number";
+            else if (std::string e = BadValue(Trimmed(fields[i]), v); !e.empty())
+                return Where(input, lineNo) + e;
             values.push_back(static_cast<float>(v));
         }
         times.push_back(t);
+        if (times.size() == 1 && t != std::floor(t))
+            return Where(input, lineNo) + "the first time " + Trimmed(fields[0]) +
+                   " is not a whole second: a file starts on a whole second";
+        if (times.size() == 2 && t <= times[0])
+            return Where(input, lineNo) + "the time must grow from row to row";
         if (times.size() >= 3) {
             const double step = times[1] - times[0];
             const double gap = times.back() - times[times.size() - 2];
@@ -229,8 +252,6 @@ std::string ImportCsv(const std::string& input, const std::string& output,
     }
     if (times.empty()) return input + ": no rows of values";
     const size_t items = width - 1;
-    if (times.size() >= 2 && times[1] <= times[0])
-        return input + ": the time must grow from row to row";
     const double step = times.size() >= 2 ? times[1] - times[0] : 1.0;
     if (!options.line) {
         if (names.size() != items) return input + ": the header line must name every item";

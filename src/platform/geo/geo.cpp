@@ -284,7 +284,9 @@ int GeoProjectionName(GeoHandle h, std::string& name) {
 int GeoCrsWkt(GeoHandle h, std::string& wkt) {
     const Frame* f = Find(h);
     if (f == nullptr) return Fail(kGeoErrHandle, "not a frame");
-    const char* text = f->none ? nullptr : proj_as_wkt(Context(), f->crs, PJ_WKT2_2019, nullptr);
+    // On one line, so that a header dump of a data file stays readable.
+    const char* const options[] = {"MULTILINE=NO", nullptr};
+    const char* text = f->none ? nullptr : proj_as_wkt(Context(), f->crs, PJ_WKT2_2019, options);
     wkt = text ? text : "";
     return 0;
 }

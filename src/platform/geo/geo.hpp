@@ -4,9 +4,11 @@
 // projected (easting, northing in metres of a map projection) and model
 // (x, y in metres on the grid, whose origin lies at a given geographic point
 // and whose y axis is turned `orientation` degrees clockwise from projection
-// north). The projection is "UTM-<zone>" (northern hemisphere), any CRS text
-// PROJ accepts ("EPSG:32632", a PROJ string, WKT), or "NON-UTM" / "LONG/LAT":
-// no map projection, where coordinates pass unchanged and the orientation is 0.
+// north). The projection is "UTM-<zone>" (northern hemisphere), any text of a
+// projected CRS that PROJ accepts ("EPSG:32632", a PROJ string, WKT, also with
+// a height or a datum shift), or "NON-UTM" / "LONG/LAT": no map projection,
+// where coordinates pass unchanged and the orientation is 0. Geographic
+// coordinates are on WGS 84.
 #pragma once
 
 #include <cstdint>
@@ -35,14 +37,15 @@ int GeoXy2Proj(GeoHandle frame, double x, double y, double& east, double& north)
 int GeoProj2Xy(GeoHandle frame, double east, double north, double& x, double& y);
 int GeoXy2Geo(GeoHandle frame, double x, double y, double& lon, double& lat);
 int GeoGeo2Xy(GeoHandle frame, double lon, double lat, double& x, double& y);
-// Degrees clockwise from the grid's y axis to true north at a model point.
+// Degrees clockwise from the grid's y axis to true north at a model point:
+// the meridian convergence of the projection on its own datum.
 int GeoTrueNorth(GeoHandle frame, double x, double y, double& degrees);
 // Degrees clockwise from the grid's y axis to projection north.
 int GeoProjectionNorth(GeoHandle frame, double& degrees);
 int GeoProjectionString(GeoHandle frame, std::string& text);
 // The CRS's own name ("WGS 84 / UTM zone 32N"), or the text for no projection.
 int GeoProjectionName(GeoHandle frame, std::string& name);
-// The CRS as WKT (empty for no projection), for the grid mapping of data files.
+// The CRS as WKT on one line (empty for no projection), for the grid mapping of data files.
 int GeoCrsWkt(GeoHandle frame, std::string& wkt);
 int GeoOrigin(GeoHandle frame, double& lon, double& lat);
 // True when two projection texts stand for the same CRS.

@@ -55,6 +55,20 @@ TEST_F(DataTool, ARealProjectionPlacesTheOriginAtTheLowerLeftCell) {
     // The lower-left cell centre, easting 500000, lies on the zone's central meridian, 9 degrees
     // east.
     EXPECT_NE(info.out.find("(longitude 9, latitude 54.14"), std::string::npos) << info.out;
+    // Back on the map where it came from, as cell centres.
+    ASSERT_EQ(Run({"export", "utm.xol2", "-o", "back.asc"}).exitCode, 0);
+    EXPECT_EQ(bwtest::ReadFile(dir / "back.asc"),
+              "ncols 2\nnrows 2\nxllcenter 500000\nyllcenter 6000000\ncellsize 20\n"
+              "NODATA_value -9999\n1 2\n3 4\n");
+    // A grid turned on its map has no ASCII grid form.
+    ASSERT_EQ(Run({"import-asc", "utm.asc", "-o", "turned.xol2", "--projection", "EPSG:32632",
+                   "--orientation", "20"})
+                  .exitCode,
+              0);
+    auto turned = Run({"export", "turned.xol2", "-o", "turned.asc"});
+    EXPECT_EQ(turned.exitCode, 1);
+    EXPECT_NE(turned.err.find("turned 20 degrees"), std::string::npos) << turned.err;
+    EXPECT_FALSE(fs::exists(dir / "turned.asc"));
 }
 
 TEST_F(DataTool, SeriesAndLinesRoundTrip) {
@@ -91,6 +105,11 @@ TEST_F(DataTool, BadInputIsNamedAndWritesNothing) {
          "ncols 2\nnrows 1\nxllcorner 0\nyllcorner 0\ncellsize 1\n1 deep\n",
          {},
          "word.asc:6: 'deep' is not a number"},
+        {"long.asc",
+         "ncols 2\nnrows 1\nxllcorner 0\nyllcorner 0\ncellsize 1\n1 2\n3 4\n",
+         {},
+         "long.asc:7: more rows than nrows 1"},
+        {"nan.csv", "time,a\n0,1\n1,nan\n", {}, "nan.csv:3: 'nan' is not a number"},
         {"uneven.csv",
          "time,a\n0,1\n1,2\n3,3\n",
          {},

@@ -23,8 +23,9 @@ void GeoFrameOpen(GeoHandle& frame, const std::string& projection, double longit
         StopRun("Unable to establish projection: " + std::string(TrimRight(projection)));
 }
 
-void GeoFrameGetOrigin(GeoHandle frame, double& longitude, double& latitude, int* status) {
-    Guard(GeoOrigin(frame, longitude, latitude), status, "GeoFrameGetOrigin");
+void GeoFrameGetOrigin(const std::string& projection, double& longitude, double& latitude,
+                       int* status) {
+    Guard(GeoProjectionOrigin(projection, longitude, latitude), status, "GeoFrameGetOrigin");
 }
 
 void GeoFrameGeo2Proj(GeoHandle frame, double lon, double lat, double& east, double& north,
@@ -71,6 +72,12 @@ void GeoFrameGetProjectionNorth(GeoHandle frame, double& degrees, int* status) {
     Guard(GeoProjectionNorth(frame, degrees), status, "GeoFrameGetProjectionNorth");
 }
 
-bool GeoFrameAreProjectionsIdentical(const std::string& a, const std::string& b) {
-    return GeoIdentical(a, b);
+void GeoFrameProjectionShortName(const std::string& projection, std::string& name, int* status) {
+    Guard(GeoShortName(projection, name), status, "GeoFrameProjectionShortName");
+}
+
+bool GeoFrameAreProjectionsIdentical(const std::string& a, const std::string& b, int* status) {
+    bool same = false;
+    Guard(GeoIdentical(a, b, same), status, "GeoFrameAreProjectionsIdentical");
+    return same;
 }

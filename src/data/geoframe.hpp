@@ -12,7 +12,9 @@
 // "Unable to establish projection: " and the text.
 void GeoFrameOpen(GeoHandle& frame, const std::string& projection, double longitude,
                   double latitude, double orientation, int* status = nullptr);
-void GeoFrameGetOrigin(GeoHandle frame, double& longitude, double& latitude, int* status = nullptr);
+// The origin of the projection itself (not of a frame's grid).
+void GeoFrameGetOrigin(const std::string& projection, double& longitude, double& latitude,
+                       int* status = nullptr);
 void GeoFrameGeo2Proj(GeoHandle frame, double lon, double lat, double& east, double& north,
                       int* status = nullptr);
 void GeoFrameProj2Geo(GeoHandle frame, double east, double north, double& lon, double& lat,
@@ -30,4 +32,7 @@ void GeoFrameGetProjectionString(GeoHandle frame, std::string& text, int* status
 void GeoFrameGetTrueNorth(GeoHandle frame, double x, double y, double& degrees,
                           int* status = nullptr);
 void GeoFrameGetProjectionNorth(GeoHandle frame, double& degrees, int* status = nullptr);
-bool GeoFrameAreProjectionsIdentical(const std::string& a, const std::string& b);
+void GeoFrameProjectionShortName(const std::string& projection, std::string& name,
+                                 int* status = nullptr);
+bool GeoFrameAreProjectionsIdentical(const std::string& a, const std::string& b,
+                                     int* status = nullptr);

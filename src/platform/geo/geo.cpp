@@ -56,7 +56,9 @@ std::string Upper(std::string text) {
     return text;
 }
 
-std::string Trimmed(const std::string& text) {
+// A text as the library takes it: cut at a terminating zero, without trailing blanks.
+std::string Trimmed(const std::string& field) {
+    const std::string text = field.substr(0, field.find('\0'));
     const size_t end = text.find_last_not_of(" \t\r\n");
     return end == std::string::npos ? "" : text.substr(0, end + 1);
 }
@@ -97,24 +99,38 @@ PJ* Normalized(PJ* operation) {
     return normal;
 }
 
+// The projected part of a CRS: a CRS with a datum shift to WGS 84 without the
+// shift, a horizontal CRS with a height without the height. A new object.
+PJ* Horizontal(const PJ* crs) {
+    PJ* h = proj_clone(Context(), crs);
+    for (;;) {
+        PJ* inner = nullptr;
+        const PJ_TYPE type = proj_get_type(h);
+        if (type == PJ_TYPE_BOUND_CRS)
+            inner = proj_get_source_crs(Context(), h);
+        else if (type == PJ_TYPE_COMPOUND_CRS)
+            inner = proj_crs_get_sub_crs(Context(), h, 0);
+        if (inner == nullptr) return h;
+        proj_destroy(h);
+        h = inner;
+    }
+}
+
+// A CRS made from a projection text, or nullptr with the failure noted.
+PJ* CreateCrs(const std::string& projection) {
+    const std::string text = GeoCrsText(projection);
+    PJ* crs = proj_create(Context(), text.c_str());
+    if (crs == nullptr) Fail(kGeoErrProjection, "unknown projection: " + text);
+    return crs;
+}
+
 // The CRS of the text, its projected part and the two transformations a frame
 // needs. A grid in metres lies only on a map projection: a geographic CRS
 // ("EPSG:4326") is refused, "LONG/LAT" being the way to say none.
 int MakeProjection(Frame& f, const std::string& text) {
-    f.crs = proj_create(Context(), text.c_str());
-    if (f.crs == nullptr) return Fail(kGeoErrProjection, "unknown projection: " + text);
-    PJ* h = proj_clone(Context(), f.crs);
-    for (;;) {
-        PJ* inner = nullptr;
-        const PJ_TYPE type = proj_get_type(h);
-        if (type == PJ_TYPE_BOUND_CRS)  // a CRS with its shift to WGS 84: the CRS itself
-            inner = proj_get_source_crs(Context(), h);
-        else if (type == PJ_TYPE_COMPOUND_CRS)  // horizontal plus height: the horizontal one
-            inner = proj_crs_get_sub_crs(Context(), h, 0);
-        if (inner == nullptr) break;
-        proj_destroy(h);
-        h = inner;
-    }
+    f.crs = CreateCrs(text);
+    if (f.crs == nullptr) return kGeoErrProjection;
+    PJ* h = Horizontal(f.crs);
     f.horizontal = h;
     const PJ_TYPE type = proj_get_type(h);
     if (type == PJ_TYPE_GEOGRAPHIC_2D_CRS || type == PJ_TYPE_GEOGRAPHIC_3D_CRS)
@@ -169,7 +185,7 @@ int GeoOpen(GeoHandle* handle, const std::string& projection, double longitude, 
     f->none = GeoIsNone(projection);
     f->orientation = f->none ? 0.0 : orientation;
     if (!f->none) {
-        if (int code = MakeProjection(*f, GeoCrsText(projection))) {
+        if (int code = MakeProjection(*f, f->projection)) {
             Release(*f);
             return code;
         }
@@ -299,14 +315,95 @@ int GeoOrigin(GeoHandle h, double& lon, double& lat) {
     return 0;
 }
 
-bool GeoIdentical(const std::string& a, const std::string& b) {
-    if (GeoIsNone(a) || GeoIsNone(b)) return Upper(Trimmed(a)) == Upper(Trimmed(b));
-    PJ* pa = proj_create(Context(), GeoCrsText(a).c_str());
-    PJ* pb = proj_create(Context(), GeoCrsText(b).c_str());
-    const bool same = pa && pb &&
-                      proj_is_equivalent_to_with_ctx(Context(), pa, pb,
-                                                     PJ_COMP_EQUIVALENT_EXCEPT_AXIS_ORDER_GEOGCRS);
+int GeoProjectionOrigin(const std::string& projection, double& lon, double& lat) {
+    lon = lat = 0.0;  // also where a projection names no origin: PROJ's defaults
+    if (GeoIsNone(projection)) return 0;
+    PJ* crs = CreateCrs(projection);
+    if (crs == nullptr) return kGeoErrProjection;
+    PJ* h = Horizontal(crs);
+    proj_destroy(crs);
+    int code = 0;
+    if (proj_get_type(h) != PJ_TYPE_PROJECTED_CRS) {
+        code = Fail(kGeoErrProjection, Trimmed(projection) + " is not a map projection");
+    } else {
+        // The longitude and latitude of the natural origin, the false origin or
+        // the projection centre, whichever the method has (EPSG parameter codes).
+        PJ* op = proj_crs_get_coordoperation(Context(), h);
+        const int count = op ? proj_coordoperation_get_param_count(Context(), op) : 0;
+        for (int i = 0; i < count; ++i) {
+            const char* authority = nullptr;
+            const char* id = nullptr;
+            double value = 0.0, toRadians = 1.0;
+            if (!proj_coordoperation_get_param(Context(), op, i, nullptr, &authority, &id, &value,
+                                               nullptr, &toRadians, nullptr, nullptr, nullptr,
+                                               nullptr) ||
+                authority == nullptr || id == nullptr || std::string(authority) != "EPSG")
+                continue;
+            const int parameter = std::atoi(id);
+            const double degrees = value * toRadians / kDegree;
+            if (parameter == 8802 || parameter == 8822 || parameter == 8812 || parameter == 8833)
+                lon = degrees;
+            else if (parameter == 8801 || parameter == 8821 || parameter == 8811)
+                lat = degrees;
+        }
+        proj_destroy(op);
+    }
+    proj_destroy(h);
+    return code;
+}
+
+int GeoShortName(const std::string& projection, std::string& name) {
+    const std::string p = Trimmed(projection);
+    if (GeoIsNone(p)) {
+        name = Upper(p);
+        return 0;
+    }
+    PJ* crs = CreateCrs(p);
+    if (crs == nullptr) return kGeoErrProjection;
+    // The authority code the CRS carries, or the one PROJ finds it identical to.
+    std::string authority, code;
+    if (const char* a = proj_get_id_auth_name(crs, 0)) {
+        authority = a;
+        code = proj_get_id_code(crs, 0);
+    } else {
+        int* confidence = nullptr;
+        PJ_OBJ_LIST* found = proj_identify(Context(), crs, "EPSG", nullptr, &confidence);
+        // 70: equivalent under another name, such as any CRS made from a PROJ string.
+        if (found != nullptr && proj_list_get_count(found) > 0 && confidence[0] >= 70) {
+            PJ* match = proj_list_get(Context(), found, 0);
+            authority = proj_get_id_auth_name(match, 0);
+            code = proj_get_id_code(match, 0);
+            proj_destroy(match);
+        }
+        proj_int_list_destroy(confidence);
+        proj_list_destroy(found);
+    }
+    const long number = std::strtol(code.c_str(), nullptr, 10);
+    if (authority == "EPSG" && number > 32600 && number <= 32660)
+        name = "UTM-" + std::to_string(number - 32600);  // our own form of a northern UTM zone
+    else if (!authority.empty())
+        name = authority + ":" + code;
+    else if (const char* n = proj_get_name(crs); n && std::string(n) != "unknown")
+        name = n;
+    else
+        name = p;
+    proj_destroy(crs);
+    return 0;
+}
+
+int GeoIdentical(const std::string& a, const std::string& b, bool& same) {
+    same = false;
+    if (GeoIsNone(a) || GeoIsNone(b)) {
+        same = Upper(Trimmed(a)) == Upper(Trimmed(b));
+        return 0;
+    }
+    PJ* pa = CreateCrs(a);
+    PJ* pb = pa ? CreateCrs(b) : nullptr;
+    if (pa && pb)
+        same = proj_is_equivalent_to_with_ctx(Context(), pa, pb,
+                                              PJ_COMP_EQUIVALENT_EXCEPT_AXIS_ORDER_GEOGCRS);
+    const int code = pa && pb ? 0 : kGeoErrProjection;
     proj_destroy(pa);
     proj_destroy(pb);
-    return same;
+    return code;
 }

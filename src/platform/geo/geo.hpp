@@ -20,6 +20,8 @@ constexpr int kGeoErrProjection = 1;  // the projection text is not understood
 constexpr int kGeoErrHandle = 2;      // not a live frame
 constexpr int kGeoErrTransform = 3;   // a point PROJ could not transform
 
+// Texts given to these calls end at the last non-blank or at a terminating zero.
+
 // True for the two texts that mean "no map projection".
 bool GeoIsNone(const std::string& projection);
 // The text PROJ is given for a projection ("UTM-32" becomes "EPSG:32632").
@@ -47,6 +49,15 @@ int GeoProjectionString(GeoHandle frame, std::string& text);
 int GeoProjectionName(GeoHandle frame, std::string& name);
 // The CRS as WKT on one line (empty for no projection), for the grid mapping of data files.
 int GeoCrsWkt(GeoHandle frame, std::string& wkt);
+// The origin given to the frame: the geographic position of model point (0, 0).
 int GeoOrigin(GeoHandle frame, double& lon, double& lat);
-// True when two projection texts stand for the same CRS.
-bool GeoIdentical(const std::string& a, const std::string& b);
+
+// Calls on a projection text alone, without a frame.
+// The projection's own origin (longitude and latitude of its natural origin,
+// false origin or centre); 0, 0 for no projection.
+int GeoProjectionOrigin(const std::string& projection, double& lon, double& lat);
+// A short name: "UTM-<zone>" for a northern UTM zone on WGS 84, else the
+// authority code ("EPSG:28992") the CRS has or is identical to, else its name.
+int GeoShortName(const std::string& projection, std::string& name);
+// Whether two projection texts stand for the same CRS; a text PROJ refuses is a failure.
+int GeoIdentical(const std::string& a, const std::string& b, bool& same);

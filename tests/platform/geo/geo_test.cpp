@@ -188,10 +188,46 @@ TEST(MapFrame, NoProjectionPassesCoordinatesAndTextsAreChecked) {
     GeoProjectionName(frame, name);
     EXPECT_EQ(name, "WGS 84 / UTM zone 32N");
     GeoClose(frame);
-    EXPECT_TRUE(GeoIdentical("UTM-32", "EPSG:32632"));
-    EXPECT_TRUE(GeoIdentical("UTM-32", "+proj=utm +zone=32 +datum=WGS84"));
-    EXPECT_FALSE(GeoIdentical("UTM-32", "UTM-33"));
-    EXPECT_TRUE(GeoIdentical("LONG/LAT", "long/lat"));
+}
+
+// The calls on a projection text alone: its origin, its short name, and
+// whether two texts name one CRS.
+TEST(MapFrame, ProjectionTextsAreComparedAndNamed) {
+    const struct {
+        const char* projection;
+        double lon, lat;
+        const char* shortName;
+    } cases[] = {
+        {"UTM-32", 9.0, 0.0, "UTM-32"},
+        {"+proj=utm +zone=31 +datum=WGS84", 3.0, 0.0, "UTM-31"},
+        {"EPSG:28992", 5.38763888888889, 52.1561605555556, "EPSG:28992"},  // oblique stereographic
+        {"EPSG:3034", 10.0, 52.0, "EPSG:3034"},                            // Lambert, false origin
+        {"EPSG:25832+5783", 9.0, 0.0, "EPSG:5555"},                        // the code of this pair
+        {"NON-UTM", 0.0, 0.0, "NON-UTM"},
+    };
+    for (const auto& c : cases) {
+        double lon = -1, lat = -1;
+        ASSERT_EQ(GeoProjectionOrigin(c.projection, lon, lat), 0) << c.projection;
+        EXPECT_NEAR(lon, c.lon, 1e-9) << c.projection;
+        EXPECT_NEAR(lat, c.lat, 1e-9) << c.projection;
+        std::string name;
+        ASSERT_EQ(GeoShortName(c.projection, name), 0) << c.projection;
+        EXPECT_EQ(name, c.shortName);
+    }
+    double lon = 0, lat = 0;
+    EXPECT_EQ(GeoProjectionOrigin("EPSG:4326", lon, lat), kGeoErrProjection);
+
+    bool same = false;
+    EXPECT_EQ(GeoIdentical("UTM-32", "EPSG:32632", same), 0);
+    EXPECT_TRUE(same);
+    GeoIdentical("UTM-32", "+proj=utm +zone=32 +datum=WGS84", same);
+    EXPECT_TRUE(same);
+    GeoIdentical("UTM-32  ", "UTM-33", same);
+    EXPECT_FALSE(same);
+    // Fixed-width fields: the text ends at its last non-blank or at a zero.
+    GeoIdentical(std::string("long/lat\0junk", 13), "LONG/LAT    ", same);
+    EXPECT_TRUE(same);
+    EXPECT_EQ(GeoIdentical("UTM-32", "no such thing", same), kGeoErrProjection);
 }
 
 }  // namespace

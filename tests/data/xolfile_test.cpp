@@ -193,28 +193,3 @@ TEST(DataFileLayer, MapsMustLieOnTheModelGrid) {
 }
 
 }  // namespace
-
-#include "data/geoframe.hpp"
-
-namespace {
-
-TEST(GuardedMapFrame, FailuresStopWithTheRoutineName) {
-    GeoHandle frame = 0;
-    int status = 0;
-    GeoFrameOpen(frame, "UTM-99", 0.0, 0.0, 0.0, &status);
-    EXPECT_NE(status, 0);
-    double lon = 0, lat = 0;
-    GeoFrameXy2Geo(987654, 0.0, 0.0, lon, lat, &status);
-    EXPECT_NE(status, 0);
-    setenv("TRF", "HUD", 1);
-    EXPECT_EXIT(GeoFrameOpen(frame, "UTM-99", 0.0, 0.0, 0.0), testing::ExitedWithCode(1),
-                "Unable to establish projection: UTM-99");
-    EXPECT_EXIT(GeoFrameXy2Geo(987654, 0.0, 0.0, lon, lat), testing::ExitedWithCode(1),
-                "Bad call to GeoFrameXy2Geo");
-    unsetenv("TRF");
-    GeoFrameOpen(frame, "UTM-32", 9.0, 54.0, 10.0);
-    GeoFrameXy2Geo(frame, 0.0, 0.0, lon, lat);
-    EXPECT_NEAR(lat, 54.0, 1e-12);
-}
-
-}  // namespace

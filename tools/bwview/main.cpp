@@ -1,18 +1,19 @@
 // bwview MODEL.bw: follows a run of bw and cancels it on request.
 //
 // On a terminal it keeps one live line (progress bar, percent, simulation
-// date and time, time step, speed, time left) and reads single keys: q or
-// Ctrl-C asks whether to cancel. When its output is no terminal it writes a
-// plain line whenever the progress changes; when its input is no terminal it
-// reads whole lines ("q", then "y" or "n"). It ends when the run's log ends,
-// with exit code 0 for a successful run and 1 otherwise.
-#include <poll.h>
-#include <sys/ioctl.h>
-#include <sys/stat.h>
-#include <termios.h>
+// date and time, time step, speed, time left, message) and reads single
+// keys: q or Ctrl-C asks whether to cancel the run. When its output is no
+// terminal it writes a plain line whenever the progress changes; when its
+// input is no terminal it reads whole lines ("q", then "y" or "n"), taken
+// only once the run has started. It ends when the run's log ends.
+//
+// Exit codes: 0 the run ended with "Successful completion", 1 with "Abnormal
+// completion", 2 a wrong command line, 3 the viewer was left before the end.
+#include <fcntl.h>
 #include <unistd.h>
 
-#include <csignal>
+#include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -21,38 +22,34 @@
 
 #include "bwview/follow.hpp"
 #include "bwview/render.hpp"
+#include "bwview/terminal.hpp"
 
 namespace {
 
-volatile sig_atomic_t gInterrupted = 0;
-termios gSavedTerminal;
-bool gRawInput = false;
+constexpr int kExitSuccessful = 0;
+constexpr int kExitAbnormal = 1;
+constexpr int kExitUsage = 2;
+constexpr int kExitLeft = 3;
 
-void RestoreTerminal() {
-    if (gRawInput) tcsetattr(STDIN_FILENO, TCSANOW, &gSavedTerminal);
-    gRawInput = false;
+const char* const kUsage = "Usage: bwview [--interval SECONDS] MODEL.bw\n";
+
+void Help() {
+    std::printf(
+        "%s"
+        "Follows the run of MODEL.bw through its message file (MODEL._spi_) and shows\n"
+        "its progress, simulation time, time step, speed and the time left.\n"
+        "  --interval SECONDS  how often the files are read (default 0.5)\n"
+        "Keys: q or Ctrl-C asks whether to cancel the run (y creates MODEL._kill_);\n"
+        "Ctrl-C at the question leaves the viewer and lets the run go on.\n"
+        "Without a terminal on standard input it reads the lines \"q\" and \"y\" or \"n\".\n"
+        "Ends when the run's log ends: exit code 0 for \"Successful completion\",\n"
+        "1 for \"Abnormal completion\", 3 when left before the end.\n",
+        kUsage);
 }
 
-void OnInterrupt(int) {
-    gInterrupted = 1;
-}
-
-void OnTerminate(int signal) {
-    RestoreTerminal();
-    std::signal(signal, SIG_DFL);
-    std::raise(signal);
-}
-
-void MakeInputRaw() {
-    if (tcgetattr(STDIN_FILENO, &gSavedTerminal) != 0) return;
-    termios raw = gSavedTerminal;
-    raw.c_lflag &= ~static_cast<tcflag_t>(ICANON | ECHO);
-    raw.c_cc[VMIN] = 0;
-    raw.c_cc[VTIME] = 0;
-    if (tcsetattr(STDIN_FILENO, TCSANOW, &raw) == 0) {
-        gRawInput = true;
-        std::atexit(RestoreTerminal);
-    }
+int UsageError(const std::string& text) {
+    std::fprintf(stderr, "bwview: %s\n%s", text.c_str(), kUsage);
+    return kExitUsage;
 }
 
 double WallNow() {
@@ -61,164 +58,191 @@ double WallNow() {
     return static_cast<double>(ts.tv_sec) + 1e-9 * static_cast<double>(ts.tv_nsec);
 }
 
-int TerminalWidth() {
-    winsize size{};
-    if (ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0) return size.ws_col;
-    return 80;
-}
+// Where the lines go: one line kept up to date on a terminal, else plain lines.
+struct Screen {
+    bool live = false;
+    FILE* prompts = stdout;  // the questions go where the user sees them
+    std::string lastPlain;   // what decided the last plain line
 
-// Input: a key on a terminal, a line otherwise. Empty when nothing came
-// within the timeout; "\x04" at the end of the input.
-struct Input {
-    bool terminal = false;
-    bool closed = false;
-    std::string pending;
-
-    std::string Next(int timeoutMs) {
-        if (const size_t nl = pending.find('\n'); nl != std::string::npos) {
-            std::string line = pending.substr(0, nl);
-            pending.erase(0, nl + 1);
-            return line.empty() ? " " : line;
-        }
-        if (closed) {
-            if (timeoutMs > 0) poll(nullptr, 0, timeoutMs);
-            return "";
-        }
-        pollfd fd{STDIN_FILENO, POLLIN, 0};
-        if (poll(&fd, 1, timeoutMs) <= 0) return "";
-        char buf[256];
-        const ssize_t n = read(STDIN_FILENO, buf, sizeof buf);
-        if (n <= 0) {
-            if (!terminal) closed = true;
-            return terminal ? "" : "\x04";
-        }
-        if (terminal) return std::string(1, buf[0]);
-        pending.append(buf, static_cast<size_t>(n));
-        return pending.find('\n') == std::string::npos ? "" : Next(0);
+    void Live(const std::string& line) {
+        std::printf("\r\033[K%s", line.c_str());
+        std::fflush(stdout);
     }
-
-    // Waits for an answer to a question: true for yes.
-    bool Yes() {
-        for (;;) {
-            const std::string answer = Next(200);
-            if (answer.empty()) {
-                if (gInterrupted) return false;
-                continue;
-            }
-            return answer[0] == 'y' || answer[0] == 'Y';
-        }
+    // A line of its own; on a terminal the live line is drawn again below it.
+    void Say(const std::string& text) {
+        std::printf("%s%s\n", live ? "\r\033[K" : "", text.c_str());
+        std::fflush(stdout);
+    }
+    void Ask(const std::string& question) {
+        if (live && prompts == stdout) std::fputs("\r\033[K", stdout);
+        std::fputs(question.c_str(), prompts);
+        std::fflush(prompts);
+    }
+    void Answered(const std::string& answer) {
+        if (live && prompts == stdout)
+            std::fputs("\r\033[K", stdout);
+        else
+            std::fprintf(prompts, "%s\n", answer.c_str());
+        std::fflush(prompts);
     }
 };
 
-void Usage(FILE* out) {
-    std::fprintf(
-        out,
-        "Usage: bwview [--interval SECONDS] MODEL.bw\n"
-        "Follows the run of MODEL.bw through its progress file and cancels it on request.\n"
-        "Keys: q or Ctrl-C asks whether to cancel the run.\n");
+std::string PlainKey(const ViewState& state) {
+    const bool step = state.message.rfind("Time step: ", 0) == 0;
+    return std::to_string(state.progress) + "|" + (step ? "" : state.message);
 }
 
-}  // namespace
+void Draw(Screen& screen, const ViewState& state, const std::string& waiting, double now) {
+    if (state.records == 0) {
+        if (screen.live) {
+            screen.Live(waiting.substr(0, static_cast<size_t>(std::max(TerminalWidth() - 1, 0))));
+        } else if (screen.lastPlain.empty()) {
+            screen.Say(waiting);
+            screen.lastPlain = "waiting";
+        }
+        return;
+    }
+    const double left = EstimateTimeLeft(state, now);
+    if (screen.live) {
+        screen.Live(RenderLine(state, left, TerminalWidth() - 1, true));
+    } else if (PlainKey(state) != screen.lastPlain) {
+        screen.Say(RenderLine(state, left, 0, false));
+        screen.lastPlain = PlainKey(state);
+    }
+}
 
-int main(int argc, char** argv) {
-    double interval = 0.5;
-    std::string model;
+bool CreateKillFiles(const RunFiles& run, Screen& screen) {
+    bool all = true;
+    std::string made;
+    for (const std::string& kill : KillFiles(run)) {
+        const int fd = open(kill.c_str(), O_WRONLY | O_CREAT, 0644);
+        if (fd < 0) {
+            std::fprintf(stderr, "\nbwview: cannot create %s: %s\n", kill.c_str(),
+                         std::strerror(errno));
+            all = false;
+            continue;
+        }
+        close(fd);
+        made += (made.empty() ? "" : ", ") + kill;
+    }
+    if (!made.empty()) screen.Say("Cancel requested: created " + made);
+    return all;
+}
+
+// Reads the options and the model file; gives an exit code when the viewer
+// ends here, else -1.
+int ReadCommandLine(int argc, char** argv, std::string& model, double& interval) {
     for (int i = 1; i < argc; ++i) {
         const std::string arg = argv[i];
         if (arg == "--help" || arg == "-h") {
-            Usage(stdout);
-            return 0;
+            Help();
+            return kExitSuccessful;
         }
-        if (arg == "--interval" && i + 1 < argc) {
-            interval = std::atof(argv[++i]);
-            if (interval <= 0.0) interval = 0.5;
-        } else if (!arg.empty() && arg[0] == '-') {
-            std::fprintf(stderr, "bwview: unknown option %s\n", arg.c_str());
-            Usage(stderr);
-            return 2;
+        if (arg == "--interval" || arg.rfind("--interval=", 0) == 0) {
+            std::string value;
+            if (arg.size() > 10) {
+                value = arg.substr(11);
+            } else if (i + 1 < argc) {
+                value = argv[++i];
+            } else {
+                return UsageError("--interval needs a number of seconds");
+            }
+            char* end = nullptr;
+            interval = std::strtod(value.c_str(), &end);
+            if (value.empty() || *end != '\0' || !(interval > 0.0) || interval > 3600.0)
+                return UsageError(
+                    "--interval needs a number of seconds above 0 and up to 3600, not '" + value +
+                    "'");
+        } else if (arg.size() > 1 && arg[0] == '-') {
+            return UsageError("unknown option " + arg);
+        } else if (!model.empty()) {
+            return UsageError("one model file only, not both " + model + " and " + arg);
         } else {
             model = arg;
         }
     }
-    if (model.empty()) {
-        std::fprintf(stderr, "bwview: no model file given\n");
-        Usage(stderr);
-        return 2;
-    }
+    if (model.empty()) return UsageError("no model file given");
+    if (!MarkOf(model).exists) return UsageError(model + ": no such file");
+    return -1;
+}
 
-    const bool terminalOut = isatty(STDOUT_FILENO);
+enum class Question { None, Cancel, Leave };
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::string model;
+    double interval = 0.5;
+    if (const int code = ReadCommandLine(argc, argv, model, interval); code >= 0) return code;
+    const int intervalMs = interval * 1000 < 1 ? 1 : static_cast<int>(interval * 1000);
+
+    Screen screen;
+    screen.live = isatty(STDOUT_FILENO);
     Input input;
     input.terminal = isatty(STDIN_FILENO);
-    if (input.terminal) MakeInputRaw();
-    std::signal(SIGINT, OnInterrupt);
-    std::signal(SIGTERM, OnTerminate);
-    std::signal(SIGHUP, OnTerminate);
+    if (input.terminal && !screen.live && isatty(STDERR_FILENO)) screen.prompts = stderr;
+    StartTerminal(screen.live);
 
     RunFiles run = LocateRun(model);
-    // A log that already ends belongs to an earlier run: wait for it to change.
-    struct stat logInfo {};
-    const bool staleLog =
-        ReadRunEnd(run.logFile) != RunEnd::Running && stat(run.logFile.c_str(), &logInfo) == 0;
-    const timespec staleTime = logInfo.st_mtim;
-
+    MarkLeftovers(run);
     ViewState state;
-    RateTracker tracker;
-    std::string lastPlain;
-    bool announced = false;
+    const std::string waiting = "Waiting for the run of " + model + " ...";
+    Question question = Question::None;
+    bool cancelRequested = false;
     for (;;) {
-        if (run.inode == 0) run = LocateRun(model);  // a run under a launcher may appear later
-        PollMessageFile(run, state);
-
-        RunEnd end = ReadRunEnd(run.logFile);
-        if (end != RunEnd::Running && staleLog) {
-            struct stat now {};
-            stat(run.logFile.c_str(), &now);
-            if (now.st_mtim.tv_sec == staleTime.tv_sec && now.st_mtim.tv_nsec == staleTime.tv_nsec)
-                end = RunEnd::Running;
+        const double now = WallNow();
+        if (!run.seen) {
+            // A run under a launcher names its files once it starts.
+            RunFiles found = LocateRun(model);
+            if (found.messageFile != run.messageFile) run = found;
         }
-
-        const double left = EstimateTimeLeft(state, WallNow(), tracker);
-        if (state.records == 0 && end == RunEnd::Running) {
-            if (!announced) {
-                std::printf("Waiting for the run of %s ...\n", model.c_str());
-                std::fflush(stdout);
-                announced = true;
-            }
-        } else if (terminalOut) {
-            std::printf("\r\033[K%s", RenderLine(state, left, TerminalWidth() - 1, true).c_str());
-            std::fflush(stdout);
-        } else {
-            const std::string line = RenderLine(state, -1.0, 0, false);
-            if (line != lastPlain) {
-                std::printf("%s\n", line.c_str());
-                std::fflush(stdout);
-                lastPlain = line;
-            }
-        }
-
+        PollMessageFile(run, state, now);
+        const RunEnd end = CheckRunEnd(run);
+        const bool started = state.records > 0;
         if (end != RunEnd::Running) {
-            if (terminalOut) std::printf("\n");
+            if (question != Question::None) screen.Answered("(the run ended)");
+            if (started) Draw(screen, state, waiting, now);
+            if (screen.live) std::printf("\n");
             std::printf("Run ended: %s\n", end == RunEnd::Successful ? "Successful completion"
                                                                      : "Abnormal completion");
-            return end == RunEnd::Successful ? 0 : 1;
+            std::fflush(stdout);
+            return end == RunEnd::Successful ? kExitSuccessful : kExitAbnormal;
         }
+        if (question == Question::None) Draw(screen, state, waiting, now);
 
-        const std::string key = input.Next(static_cast<int>(interval * 1000));
-        const bool ask = gInterrupted || key == "q" || key == "Q" || key == "\x03";
-        if (!ask) continue;
-        gInterrupted = 0;
-        std::printf("%sCancel the run of %s? [y/N] ", terminalOut ? "\n" : "", model.c_str());
-        std::fflush(stdout);
-        if (input.Yes()) {
-            for (const std::string& kill : KillFiles(run)) {
-                if (FILE* f = std::fopen(kill.c_str(), "w")) std::fclose(f);
-                std::printf("\nCancel requested: %s", kill.c_str());
+        const bool read = started || input.terminal || question != Question::None;
+        const InputEvent event = WaitForInput(input, intervalMs, read);
+        if (question == Question::None) {
+            const bool ask =
+                event.kind == InputKind::Interrupt ||
+                (event.kind == InputKind::Text && (event.text == "q" || event.text == "Q"));
+            if (!ask) continue;
+            if (!started) {
+                screen.Say("Left the viewer before the run of " + model + " started.");
+                return kExitLeft;
             }
-            std::printf("\n");
-        } else {
-            std::printf("\nThe run goes on.\n");
+            question = cancelRequested ? Question::Leave : Question::Cancel;
+            screen.Ask(cancelRequested ? "The cancel is requested; leave the viewer? [y/N] "
+                                       : "Cancel the run of " + model + "? [y/N] ");
+            continue;
         }
-        std::fflush(stdout);
-        gInterrupted = 0;
+        if (event.kind == InputKind::None) continue;
+        if (event.kind == InputKind::Interrupt) {
+            screen.Answered("(interrupted)");
+            screen.Say("Left the viewer; the run of " + model + " goes on.");
+            return kExitLeft;
+        }
+        const bool yes = event.kind == InputKind::Text && !event.text.empty() &&
+                         (event.text[0] == 'y' || event.text[0] == 'Y');
+        screen.Answered(event.kind == InputKind::Closed ? "(no answer)" : yes ? "y" : "n");
+        if (question == Question::Leave && yes) {
+            screen.Say("Left the viewer; the run of " + model + " goes on.");
+            return kExitLeft;
+        }
+        if (question == Question::Cancel && yes)
+            cancelRequested = CreateKillFiles(run, screen);
+        else if (!screen.live)
+            screen.Say("The run goes on.");
+        question = Question::None;
     }
 }

@@ -1,19 +1,45 @@
 #include "bwview/render.hpp"
 
+#include <algorithm>
 #include <cstdio>
+#include <vector>
 
-double EstimateTimeLeft(const ViewState& state, double nowWall, RateTracker& tracker) {
-    if (state.timeLeft >= 0) return static_cast<double>(state.timeLeft);
-    if (state.progress < 0) return -1.0;
-    if (tracker.firstProgress < 0 || state.progress < tracker.firstProgress) {
-        tracker.firstProgress = state.progress;
-        tracker.firstWall = nowWall;
-        return -1.0;
+namespace {
+
+constexpr int kMinBarCells = 10;
+constexpr int kMaxBarCells = 40;
+constexpr int kBarFrame = 3;  // "[", "]" and the blank behind
+const std::string kSeparator = "  ";
+const std::string kStepPrefix = "Time step: ";
+
+// One piece of the line; a lower rank is kept longer when space is short.
+struct Piece {
+    std::string text;
+    int rank;
+};
+
+int Length(const std::vector<Piece>& pieces) {
+    int length = 0;
+    for (const Piece& piece : pieces) {
+        if (length > 0) length += static_cast<int>(kSeparator.size());
+        length += static_cast<int>(piece.text.size());
     }
-    const int gained = state.progress - tracker.firstProgress;
-    const double elapsed = nowWall - tracker.firstWall;
-    if (gained <= 0 || elapsed <= 0.0) return -1.0;
-    return (1000 - state.progress) * elapsed / gained;
+    return length;
+}
+
+}  // namespace
+
+double EstimateTimeLeft(const ViewState& state, double nowWall) {
+    if (state.timeLeft >= 0) return static_cast<double>(state.timeLeft);
+    if (state.progress < 0 || state.firstProgress < 0) return -1.0;
+    if (state.progress >= 1000) return 0.0;
+    const int gained = state.progress - state.firstProgress;
+    const double span = state.changeWall - state.firstWall;
+    if (gained <= 0 || span <= 0.0) return -1.0;
+    // The time the rest takes at the rate so far, less what passed since the
+    // last change, so that the estimate counts down between reports.
+    const double left = (1000 - state.progress) * span / gained - (nowWall - state.changeWall);
+    return left > 0.0 ? left : 0.0;
 }
 
 std::string FormatDuration(double seconds) {
@@ -41,24 +67,48 @@ std::string FormatSpeed(long long pointsPerSecond) {
 }
 
 std::string RenderLine(const ViewState& state, double secondsLeft, int width, bool bar) {
-    const int perMille = state.progress < 0 ? 0 : (state.progress > 1000 ? 1000 : state.progress);
+    const int perMille = std::clamp(state.progress, 0, 1000);
     char percent[16];
     std::snprintf(percent, sizeof percent, "%5.1f%%", perMille / 10.0);
 
-    std::string rest = std::string(percent);
-    if (!state.status.empty()) rest += "  " + state.status;
-    const std::string stepPrefix = "Time step: ";
-    const bool stepMessage = state.message.rfind(stepPrefix, 0) == 0;
-    if (stepMessage) rest += "  step " + state.message.substr(stepPrefix.size());
-    if (state.speed >= 0) rest += "  " + FormatSpeed(state.speed);
-    if (secondsLeft >= 0.0) rest += "  left " + FormatDuration(secondsLeft);
-    if (!stepMessage && !state.message.empty()) rest += "  " + state.message;
+    const bool stepMessage = state.message.rfind(kStepPrefix, 0) == 0;
+    std::vector<Piece> pieces{{percent, 0}};
+    if (!state.status.empty()) pieces.push_back({state.status, 4});
+    if (stepMessage) pieces.push_back({"step " + state.message.substr(kStepPrefix.size()), 3});
+    if (state.speed >= 0) pieces.push_back({FormatSpeed(state.speed), 5});
+    if (secondsLeft >= 0.0 && perMille < 1000)
+        pieces.push_back({"left " + FormatDuration(secondsLeft), 2});
+    if (!stepMessage && !state.message.empty()) pieces.push_back({state.message, 6});
 
+    if (width > 0) {
+        // Room for the pieces once the smallest bar is drawn.
+        int room = width - (bar ? kMinBarCells + kBarFrame : 0);
+        if (room < static_cast<int>(pieces.front().text.size())) {
+            bar = false;
+            room = width;
+        }
+        while (pieces.size() > 1 && Length(pieces) > room) {
+            // A message at the end is cut rather than left out while a fair part of it fits.
+            Piece& last = pieces.back();
+            const int over = Length(pieces) - room;
+            if (last.rank == 6 && static_cast<int>(last.text.size()) - over >= 12) {
+                last.text = last.text.substr(0, last.text.size() - static_cast<size_t>(over));
+                break;
+            }
+            const auto drop =
+                std::max_element(pieces.begin(), pieces.end(),
+                                 [](const Piece& a, const Piece& b) { return a.rank < b.rank; });
+            pieces.erase(drop);
+        }
+    }
+
+    std::string rest;
+    for (const Piece& piece : pieces) rest += (rest.empty() ? "" : kSeparator) + piece.text;
     std::string line;
     if (bar) {
-        int cells = width - static_cast<int>(rest.size()) - 3;
-        if (cells > 30) cells = 30;
-        if (cells < 10) cells = 10;
+        const int cells = width > 0 ? std::clamp(width - kBarFrame - static_cast<int>(rest.size()),
+                                                 kMinBarCells, kMaxBarCells)
+                                    : kMaxBarCells / 2;
         const int full = perMille * cells / 1000;
         line = "[" + std::string(full, '#') + std::string(cells - full, '-') + "] ";
     }

@@ -1,0 +1,43 @@
+// Internal wave generation: waves born on straight lines of points inside
+// the grid, by a prescribed flux added to the continuity equation there.
+// Every point of a line gets a number; the flat vectors below hold the source
+// values of those numbers, renewed at each half step, and the sweeps and the
+// surface extrapolation read them.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "platform/kvt/kvt.hpp"
+
+struct InternalGenRecord {
+    int32_t pointCount = 0;  // np: the number of points less 1
+    int32_t waveType = 0;    // 0: one value from a series; else a line file
+    int32_t seriesId = 0, deepSeriesId = 0;
+    std::vector<int32_t> pointJ, pointK;  // 0..np
+    std::string fileName;
+    int32_t itemCount = 0;
+    int32_t itemNumbers[2] = {0, 0};
+    float lineNew = 0.0f, lineHalf = 0.0f, deepNew = 0.0f, deepHalf = 0.0f;
+};
+
+struct GenerationState {
+    int32_t numberOfRecords = 0;  // above 0: internal generation is active
+    std::vector<InternalGenRecord> records;
+    std::vector<int32_t> sourceIndex;  // over the grid; 0 none, else the number from 1
+    int32_t sourceCount = 0;
+    // Flat vectors, element 0 unused so that number i stands at index i.
+    std::vector<float> sourceP, sourcePPrev, sourcePPrev2;
+    std::vector<float> sourceQ, sourceQPrev, sourceQPrev2;
+    std::vector<float> sourceXiX, sourceXiY;  // with Deep_Water_Terms only
+    int32_t genJ1 = 0, genJ2 = 0, genK1 = 0, genK2 = 0;
+};
+extern GenerationState gGeneration;
+
+void SetupInternalGeneration(KvtHandle target);
+// The number of the source at grid point p (index into a field), 0 when
+// internal generation is off or the point has none.
+inline int32_t SourceAt(size_t p) {
+    return gGeneration.numberOfRecords > 0 ? gGeneration.sourceIndex[p] : 0;
+}

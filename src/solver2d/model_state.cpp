@@ -1,0 +1,41 @@
+#include "solver2d/model_state.hpp"
+
+#include <new>
+
+#include "run/messages.hpp"
+
+GridState gGrid;
+EquationSettings gEquation;
+ChainTables gChains;
+OptionSettings gOptions;
+
+namespace {
+
+void Fill(Field& field, size_t points, float value) { field.assign(points, value); }
+
+}  // namespace
+
+void AllocateModelState() {
+    GridState& g = gGrid;
+    const size_t n = g.Points();
+    try {
+        for (Field* f : {&g.xi, &g.P, &g.Q, &g.xiPrev, &g.PPrev, &g.QPrev, &g.xiPrev2})
+            Fill(*f, n, 1e-10f);
+        for (Field* f : {&g.depth, &g.depthExtX, &g.depthExtY}) Fill(*f, n, 10.0f);
+        for (Field* f : {&g.xiExtX, &g.xiExtY, &g.pxyt, &g.qxyt, &g.work, &g.filterBuffer})
+            Fill(*f, n, 0.0f);
+        g.PWest.assign(static_cast<size_t>(g.K) + 1, 0.0f);
+        g.QSouth.assign(static_cast<size_t>(g.J) + 1, 0.0f);
+        gChains.codeX.assign(n, -1);
+        gChains.codeY.assign(n, -1);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
+}
+
+void ResetModelState() {
+    gGrid = GridState{};
+    gEquation = EquationSettings{};
+    gChains = ChainTables{};
+    gOptions = OptionSettings{};
+}

@@ -1,0 +1,113 @@
+#include "support/model_builder.hpp"
+
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "data/xolfile.hpp"
+
+namespace bwtest {
+
+void WriteMapFile(const std::string& path, const MapSpec& spec, const std::vector<float>& values) {
+    XolFile f = XolCreateHeader("Test map", 1, 2);
+    XolSetItem(f, 1, 100079, spec.itemName, 1000);
+    XolSetAxis(f, 1, spec.dx, 0.0f, spec.J + 1);
+    XolSetAxis(f, 2, spec.dy, 0.0f, spec.K + 1);
+    XolSetCalendarAxis(f, 1.0, "2000-01-01 00:00:00");
+    XolSetDataType(f, spec.dataType);
+    XolSetProjection(f, spec.projection, spec.longitude, spec.latitude, spec.orientation);
+    XolCreateFile(f, path);
+    XolWriteDynamic(f, values.data());
+    XolClose(f);
+}
+
+std::vector<float> Constant(const MapSpec& spec, float value) {
+    return std::vector<float>(static_cast<size_t>(spec.J + 1) * (spec.K + 1), value);
+}
+
+void WriteSeriesFile(const std::string& path, const std::string& start, double step,
+                     const std::vector<std::vector<float>>& items,
+                     const std::vector<std::string>& names) {
+    const int count = static_cast<int>(items.size());
+    XolFile f = XolCreateHeader("Test series", count, 0);
+    for (int i = 0; i < count; ++i)
+        XolSetItem(f, i + 1, 100078, i < static_cast<int>(names.size()) ? names[i]
+                                                                        : "Item " + std::to_string(i + 1),
+                   1000);
+    XolSetCalendarAxis(f, step, start);
+    XolCreateFile(f, path);
+    for (size_t n = 0; n < items[0].size(); ++n)
+        for (int i = 0; i < count; ++i) XolWriteDynamic(f, &items[i][n]);
+    XolClose(f);
+}
+
+void WriteLineFile(const std::string& path, const std::string& start, double step, float spacing,
+                   const std::vector<std::vector<std::vector<float>>>& items, int dataType,
+                   const std::vector<std::string>& names) {
+    const int count = static_cast<int>(items.size());
+    XolFile f = XolCreateHeader("Test line", count, 1);
+    for (int i = 0; i < count; ++i)
+        XolSetItem(f, i + 1, 100078, i < static_cast<int>(names.size()) ? names[i]
+                                                                        : "Item " + std::to_string(i + 1),
+                   1000);
+    XolSetAxis(f, 1, spacing, 0.0f, static_cast<int32_t>(items[0][0].size()));
+    XolSetCalendarAxis(f, step, start);
+    XolSetDataType(f, dataType);
+    XolCreateFile(f, path);
+    for (size_t n = 0; n < items[0].size(); ++n)
+        for (int i = 0; i < count; ++i) XolWriteDynamic(f, items[i][n].data());
+    XolClose(f);
+}
+
+std::string DataFileSection(const std::string& file, int item) {
+    std::ostringstream s;
+    s << "DATA_FILE {\n    File_name = file(\"" << file << "\")\n    Item_Count = 1\n"
+      << "    Item_Numbers = " << item << "\n}\n";
+    return s.str();
+}
+
+std::string ModelText(const std::string& bathymetryFile,
+                      const std::map<std::string, std::string>& sections) {
+    const std::vector<std::pair<std::string, std::string>> defaults = {
+        {"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 2\nOPEN_LOG_FILE_AFTER_RUN = 0\n"},
+        {"Bathymetry_Selection", "Hot_Start = false\n" + DataFileSection(bathymetryFile)},
+        {"Area_Description", "True_land_value = 0\nReference_Level_Shift = 0\n"},
+        {"Simulation_Period",
+         "Time_step_count = 10\nTime_step_interval = 0.1\nWarm_up_period = 0\n"
+         "Start_time = 2004, 1, 1, 0, 0, 0\n"},
+        {"Equation_Parameters", "Deep_Water_Terms = false\nDispersion_Factor = 0\n"},
+        {"SOLUTION_PARAMETERS", "Convective_terms_handle = 0\n"},
+        {"MOVING_SHORELINE", "type = 0\n"},
+        {"Bottom_Friction", "Resistance_Type = 0\n"},
+        {"WAVE_BREAKING", "type = 0\n"},
+        {"EXPLICIT_FILTERING", "type = 0\n"},
+        {"EDDY_VISCOSITY", "Type = 0\n"},
+        {"Porosity", "Porosity_Type = false\n"},
+        {"Sponge", "Sponge_Type = false\n"},
+        {"SURFACE_ELEVATION", "SURFACE_TYPE = 0\nConstant_Value = 0\n"},
+        {"Boundary_Location", "Number_Of_Boundaries = 0\n"},
+        {"Internal_Generation", "Number_Of_Records = 0\n"},
+        {"Output_Deterministic_2D", "Number_Of_Records = 0\n"},
+        {"Output_Statistic_2D", "Type = 0\n"},
+        {"Output_Disturbance_2D", "Type = 0\n"},
+        {"Output_Hotstart_2D", "Hot_Start = false\n"},
+        {"OPTION_PARAMETERS", "HUD_update_2DH = 0\n"},
+    };
+    for (const auto& [name, body] : sections) {
+        bool known = false;
+        for (const auto& d : defaults) known = known || d.first == name;
+        EXPECT_TRUE(known) << "ModelText: no section " << name;
+    }
+    std::ostringstream s;
+    s << "TARNEL_BOUSSINESQ_WAVE {\n";
+    for (const auto& [name, fallback] : defaults) {
+        const auto given = sections.find(name);
+        const std::string& body = given != sections.end() ? given->second : fallback;
+        if (body == "-") continue;
+        s << name << " {\n" << body << "}\n";
+    }
+    s << "}\n";
+    return s.str();
+}
+
+}  // namespace bwtest

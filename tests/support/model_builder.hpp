@@ -1,0 +1,46 @@
+// Small models for the tests: data files of bathymetry, maps and boundary
+// series written through the data-file layer, and the text of a complete
+// model file whose sections can be replaced one by one.
+#pragma once
+
+#include <map>
+#include <string>
+#include <vector>
+
+namespace bwtest {
+
+// A map over (0..J, 0..K), values x fastest, one item, one step, on the
+// given projection ("NON-UTM" is a plain local frame).
+struct MapSpec {
+    int J = 10, K = 10;
+    float dx = 1.0f, dy = 1.0f;
+    std::string projection = "NON-UTM";
+    double longitude = 0.0, latitude = 0.0, orientation = 0.0;
+    std::string itemName = "Bathymetry";
+    int dataType = 0;
+};
+void WriteMapFile(const std::string& path, const MapSpec& spec, const std::vector<float>& values);
+// A map of one value everywhere.
+std::vector<float> Constant(const MapSpec& spec, float value);
+
+// A 0-dimensional series file: items[i][n] is item i at start + n*step seconds.
+void WriteSeriesFile(const std::string& path, const std::string& start, double step,
+                     const std::vector<std::vector<float>>& items,
+                     const std::vector<std::string>& names = {});
+// A 1-dimensional line file: items[i][n][s] is item i at step n and point s.
+void WriteLineFile(const std::string& path, const std::string& start, double step, float spacing,
+                   const std::vector<std::vector<std::vector<float>>>& items, int dataType = 0,
+                   const std::vector<std::string>& names = {});
+
+// The text of a model file that holds every section of the tree in its
+// order. Each section's body has a working default (a cold start at level 0,
+// no processes, no outputs); sections[name] replaces the body of a section,
+// and a body of "-" leaves the section out. The bathymetry file is named by
+// bathymetryFile, relative to the model file's folder.
+std::string ModelText(const std::string& bathymetryFile,
+                      const std::map<std::string, std::string>& sections = {});
+
+// The body of a DATA_FILE section naming a file with item 1.
+std::string DataFileSection(const std::string& file, int item = 1);
+
+}  // namespace bwtest

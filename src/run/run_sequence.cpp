@@ -12,6 +12,7 @@
 #include "run/run_state.hpp"
 #include "run/timing.hpp"
 #include "run/units.hpp"
+#include "solver2d/time_loop.hpp"
 
 RunState gRun;
 
@@ -113,8 +114,8 @@ void RunMain(int argc, const char* const* argv) {
     SetThreads(gProcess.maxThreads);
     StopTiming(gOverallTiming, kTaskPreProcessing);
 
-    // The solvers hand back their exit code in gRun.runExitCode; the 2DH time
-    // loop and the mesh solver are called here once they are part of the engine.
+    // The solver hands back its exit code: 0, or -1 after a cancel.
+    if (gBasic.numberOfDimensions == 2) Compute(gRun.runExitCode);
 
     StopTiming(gOverallTiming, kTaskTotal);
     WriteTimingReport(gOverallTiming);

@@ -27,6 +27,12 @@ extern TimeLoopState gLoop;
 
 // The whole 2DH run: chains, outputs, the time steps, closing.
 void Compute(int& exitCode);
+// Before the first step: the chains, the count of active points and the
+// sweep buffers (the first acts of Compute, for tests that drive the loop).
+void PrepareTimeLoop();
+// The computing of time step n: the row of the series, the boundary data,
+// the x half and the y half. The caller writes output and turns the line order.
+void ComputeStep(int32_t n);
 // target = surface - bed at all points, then the slot correction. Parallel over k.
 void CalculateDepth(int32_t J, int32_t K, float* target, const float* bed, const float* surface);
 void ExtrapolateSurfaceElevationX(float* xiExt);

@@ -1,0 +1,433 @@
+#include "solver2d/sweep_rows.hpp"
+
+#include <algorithm>
+#include <cmath>
+
+#include "processes/friction.hpp"
+#include "processes/internal_generation.hpp"
+#include "processes/open_boundaries.hpp"
+#include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
+#include "solver2d/chains.hpp"
+#include "solver2d/sweeps.hpp"
+
+namespace {
+
+const float kNone[1] = {0.0f};
+
+// The rule of neighbours across a line: a land neighbour mirrors the line.
+inline bool NorthAllowed(int32_t code) { return code == 4 || code == 2; }
+inline bool SouthAllowed(int32_t code) { return code == 4 || code == 3; }
+
+// The row of boundary b's table that holds point (j,k) of the grid.
+int32_t TableRow(int32_t b, int32_t j, int32_t k) {
+    const BoundaryRecord& r = Boundary(b);
+    return (r.orientation == 1 || r.orientation == 3) ? k - r.first[1] : j - r.first[0];
+}
+
+// The boundary of a mark at a chain's end; none is a blow-up.
+int32_t EndBoundary(const AxisView& v, int32_t j, int32_t k) {
+    const int32_t gj = v.axis == 1 ? j : k, gk = v.axis == 1 ? k : j;
+    const int32_t b = FindBoundary(gj, gk, v.endAxis);
+    if (b == 0) BlowUp("Undefined open boundary point, near (%,%)", gj, gk);
+    return b;
+}
+
+}  // namespace
+
+void ChainRows::Reserve(int32_t points) {
+    if (points <= capacity) return;
+    capacity = points;
+    const size_t n = static_cast<size_t>(points) + 3;
+    for (auto* r : {&p, &pN, &pS, &qC, &qS, &qCo, &qSo, &sE, &sEN, &sES, &dE, &dEN, &dES, &por,
+                    &c, &dpt, &nP, &dP, &DP, &Dx, &Dy, &U, &Fr, &fac, &da, &db, &dc, &dr, &m1,
+                    &m2, &m3, &m4, &rr})
+        r->assign(n, 0.0f);
+    src.assign(n, 0);
+    for (auto* r : {&uE, &uW, &vN, &vS}) r->assign(n, 0.0);
+    solve.assign(7 * (2 * n + 4), 0.0f);
+}
+
+AxisView MakeAxisView(int32_t axis) {
+    GridState& g = gGrid;
+    GenerationState& s = gGeneration;
+    const bool gen = s.numberOfRecords > 0;
+    const bool deep = gen && gEquation.deepWaterTerms;
+    AxisView v;
+    v.axis = axis;
+    if (axis == 1) {
+        v.n = g.J;
+        v.lines = g.K;
+        v.along = 1;
+        v.across = g.Stride();
+        v.ds = g.dx;
+        v.dn = g.dy;
+        v.F = g.P.data(), v.FPrev = g.PPrev.data(), v.FDiff = g.pxyt.data(), v.FEdge = g.PWest.data();
+        v.G = g.Q.data(), v.GPrev = g.QPrev.data(), v.GDiff = g.qxyt.data();
+        v.codeN = gChains.codeX.data(), v.codeE = gChains.codeY.data();
+        v.chainCount = &gChains.chainCountX, v.chains = &gChains.chainX;
+        v.maxChains = gChains.maxChainsX;
+        v.xiExt = g.xiExtX.data(), v.depthExt = g.depthExtX.data();
+        v.coriolisSign = 1.0;
+        v.levelColumn = 2, v.replaceColumn = 4, v.gradientColumn = 6;
+        v.endAxis = 1;
+        v.sF = gen ? s.sourceP.data() : kNone, v.sFPrev = gen ? s.sourcePPrev.data() : kNone;
+        v.sG = gen ? s.sourceQ.data() : kNone, v.sGPrev = gen ? s.sourceQPrev.data() : kNone;
+        v.sGPrev2 = gen ? s.sourceQPrev2.data() : kNone;
+        v.sXiAlong = deep ? s.sourceXiX.data() : kNone;
+        v.sXiAcross = deep ? s.sourceXiY.data() : kNone;
+    } else {
+        v.n = g.K;
+        v.lines = g.J;
+        v.along = g.Stride();
+        v.across = 1;
+        v.ds = g.dy;
+        v.dn = g.dx;
+        v.F = g.Q.data(), v.FPrev = g.QPrev.data(), v.FDiff = g.qxyt.data(), v.FEdge = g.QSouth.data();
+        v.G = g.P.data(), v.GPrev = g.PPrev.data(), v.GDiff = g.pxyt.data();
+        v.codeN = gChains.codeY.data(), v.codeE = gChains.codeX.data();
+        v.chainCount = &gChains.chainCountY, v.chains = &gChains.chainY;
+        v.maxChains = gChains.maxChainsY;
+        v.xiExt = g.xiExtY.data(), v.depthExt = g.depthExtY.data();
+        v.coriolisSign = -1.0;
+        v.levelColumn = 1, v.replaceColumn = 3, v.gradientColumn = 5;
+        v.endAxis = 2;
+        v.sF = gen ? s.sourceQ.data() : kNone, v.sFPrev = gen ? s.sourceQPrev.data() : kNone;
+        v.sG = gen ? s.sourceP.data() : kNone, v.sGPrev = gen ? s.sourcePPrev.data() : kNone;
+        v.sGPrev2 = gen ? s.sourcePPrev2.data() : kNone;
+        v.sXiAlong = deep ? s.sourceXiY.data() : kNone;
+        v.sXiAcross = deep ? s.sourceXiX.data() : kNone;
+    }
+    return v;
+}
+
+SweepConstants MakeSweepConstants(const AxisView& v) {
+    SweepConstants s;
+    s.B = gEquation.deepWaterTerms ? static_cast<double>(gEquation.dispersionFactor) : 0.0;
+    s.B3 = gEquation.deepWaterTerms ? s.B + 1.0 / 3.0 : static_cast<double>(0.33333334f);
+    s.fc = std::sin(gGrid.latitude) * static_cast<double>(1.458e-4f) * 0.5;
+    s.dt = gGrid.dt;
+    s.dx = v.ds;
+    s.dy = v.dn;
+    return s;
+}
+
+void CheckChainDepth(const AxisView& v, int32_t k, int32_t first, int32_t last) {
+    const float* depth = gGrid.depth.data();
+    for (int32_t j = first; j <= last; ++j) {
+        const float d = depth[v.At(j, k)];
+        // A not-a-number passes: the comparisons are false for it.
+        if (d < 0.0001f || d > 1e10f) {
+            if (v.axis == 1) BlowUp("Negative water depth, near (%,%)", j, k);
+            BlowUp("Negative water depth, near (%,%)", k, j);
+        }
+    }
+}
+
+void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
+                   ChainRows& w) {
+    const GridState& g = gGrid;
+    const int32_t m = last - first + 1;
+    w.Reserve(m + 2);
+    const float* Fold = central ? v.F : v.FPrev;
+    const float* bed = g.bed.data();
+    const float* depth = g.depth.data();
+    const float* xiPrev = g.xiPrev.data();
+    const float* porosity = gPorosity.porosity.data();
+    const bool slot = gShoreline.type > 0;
+    const bool deep = gEquation.deepWaterTerms;
+    const bool gen = gGeneration.numberOfRecords > 0;
+    const size_t up = v.across, base = v.At(first, k);
+
+    for (int32_t r = 1; r <= m; ++r) {
+        const size_t pt = base + (r - 1) * v.along;
+        const int32_t code = v.codeN[pt];
+        const bool nOk = NorthAllowed(code), sOk = SouthAllowed(code);
+        w.p[r] = Fold[pt];
+        w.qC[r] = v.G[pt];
+        w.qS[r] = v.G[pt - up];
+        w.qCo[r] = v.GPrev[pt];
+        w.qSo[r] = v.GPrev[pt - up];
+        w.dE[r] = v.depthExt[pt];
+        w.dEN[r] = nOk ? v.depthExt[pt + up] : w.dE[r];
+        w.dES[r] = sOk ? v.depthExt[pt - up] : w.dE[r];
+        if (deep) {
+            w.sE[r] = v.xiExt[pt];
+            w.sEN[r] = nOk ? v.xiExt[pt + up] : w.sE[r];
+            w.sES[r] = sOk ? v.xiExt[pt - up] : w.sE[r];
+        }
+        w.por[r] = porosity[pt];
+        w.c[r] = slot ? StorageWidthAt(v.axis == 1 ? first + r - 1 : k,
+                                       v.axis == 1 ? k : first + r - 1, xiPrev[pt])
+                      : 1.0f;
+        w.dpt[r] = depth[pt];
+        w.src[r] = gen ? gGeneration.sourceIndex[pt] : 0;
+    }
+    w.src[0] = w.src[m + 1] = 0;
+    // Fluxes of the neighbouring lines at the faces: both points must allow.
+    for (int32_t r = 1; r <= m; ++r) {
+        const size_t pt = base + (r - 1) * v.along;
+        const int32_t j = first + r - 1;
+        const int32_t c0 = v.codeN[pt];
+        const int32_t c1 = j < v.n ? v.codeN[pt + v.along] : c0;
+        w.pN[r] = (NorthAllowed(c0) && NorthAllowed(c1)) ? Fold[pt + up] : w.p[r];
+        w.pS[r] = (SouthAllowed(c0) && SouthAllowed(c1)) ? Fold[pt - up] : w.p[r];
+    }
+
+    // Ends: land closes the chain; a level boundary brings its outer flux
+    // and the curvature of the surface across it.
+    w.p[0] = 0.0f;
+    w.p[m + 1] = 0.0f;
+    w.sE[0] = w.sE[m + 1] = 0.0f;
+    const int32_t west = v.codeE[base];
+    const int32_t east = v.codeE[base + (m - 1) * v.along];
+    const float ds2 = v.ds * v.ds;
+    if (west == kCodeLevelBoundary) {
+        const int32_t b = EndBoundary(v, first, k);
+        const BoundaryTable& t = BoundaryValues(b);
+        const int32_t s = TableRow(b, v.axis == 1 ? first : k, v.axis == 1 ? k : first);
+        if (Boundary(b).specification == 2)
+            w.p[0] = t.Value(s, v.replaceColumn);
+        else
+            w.p[0] = first == 0 ? v.FEdge[k] : v.F[base - v.along];
+        if (deep) w.sE[0] = ds2 * t.Value(s, v.gradientColumn) + 2.0f * w.sE[1] - w.sE[2];
+    } else if (west == 2 && deep) {
+        w.sE[0] = w.sE[1];
+    }
+    if (east == kCodeLevelBoundary) {
+        const int32_t b = EndBoundary(v, last, k);
+        const BoundaryTable& t = BoundaryValues(b);
+        const int32_t s = TableRow(b, v.axis == 1 ? last : k, v.axis == 1 ? k : last);
+        if (Boundary(b).specification == 2) w.p[m] = t.Value(s, v.replaceColumn);
+        if (deep)
+            w.sE[m + 1] = 2.0f * w.sE[m] - w.sE[m - 1] + ds2 * t.Value(s, v.gradientColumn);
+    } else if (east == 3 && deep) {
+        w.sE[m + 1] = w.sE[m];
+    }
+
+    // Face rows.
+    for (int32_t r = 1; r < m; ++r) {
+        const size_t pt = base + (r - 1) * v.along, pe = pt + v.along;
+        const float D0 = -bed[pt], D1 = -bed[pe];
+        const float DN0 = NorthAllowed(v.codeN[pt]) ? -bed[pt + up] : D0;
+        const float DS0 = SouthAllowed(v.codeN[pt]) ? -bed[pt - up] : D0;
+        const float DN1 = NorthAllowed(v.codeN[pe]) ? -bed[pe + up] : D1;
+        const float DS1 = SouthAllowed(v.codeN[pe]) ? -bed[pe - up] : D1;
+        w.nP[r] = (w.por[r] + w.por[r + 1]) * 0.5f;
+        w.dP[r] = (w.dE[r] + w.dE[r + 1]) * 0.5f;
+        w.DP[r] = (D0 + D1) * 0.5f;
+        w.Dx[r] = (D1 - D0) / v.ds;
+        w.Dy[r] = static_cast<float>(((static_cast<double>(DN0) - DS0) + (static_cast<double>(DN1) - DS1)) *
+                                     0.25 / v.dn);
+        w.fac[r] = (gen && (w.src[r] >= 1 || w.src[r + 1] >= 1)) ? 0.0f : 1.0f;
+    }
+}
+
+void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
+    const int32_t m = last - first + 1;
+    const size_t base = v.At(first, k);
+    const bool chezy = gFriction.formulation == 1;
+    for (int32_t r = 1; r < m; ++r) {
+        const float qm = (w.qC[r] + w.qC[r + 1] + w.qS[r] + w.qS[r + 1] + w.qCo[r] + w.qCo[r + 1] +
+                          w.qSo[r] + w.qSo[r + 1]) *
+                         0.125f;
+        w.U[r] = std::sqrt(qm * qm + w.p[r] * w.p[r]);
+        if (gFriction.resistanceType == 0) {
+            w.Fr[r] = 0.0f;
+            continue;
+        }
+        const float F = FrictionCoefficientAt(base + (r - 1) * v.along);
+        const float h1 = w.dpt[r], h2 = w.dpt[r + 1];
+        const float hf = std::sqrt(2.0f / (1.0f / (h1 * h1) + 1.0f / (h2 * h2)));
+        if (chezy) {
+            w.Fr[r] = F / (hf * hf);
+        } else {
+            const float x = 0.166667f * std::log(hf);
+            const float E = ((x * 0.166667f + 0.5f) * x + 1.0f) * x + 1.0f;
+            w.Fr[r] = F / (hf * hf * E * E);
+        }
+    }
+}
+
+void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
+    const int32_t m = last - first + 1;
+    if (gRollers.type != 1 || gRollers.delta.empty()) {
+        for (int32_t r = 1; r < m; ++r) w.rr[r] = 0.0f;
+        return;
+    }
+    const float* delta = gRollers.delta.data();
+    const float* cAlong = v.axis == 1 ? gRollers.cx.data() : gRollers.cy.data();
+    const float* cAcross = v.axis == 1 ? gRollers.cy.data() : gRollers.cx.data();
+    const size_t up = v.across, base = v.At(first, k);
+    auto wf = [](double a, double b) { return a / (1.0 - a / b); };
+    for (int32_t r = 1; r < m; ++r) {
+        const size_t p0 = base + (r - 1) * v.along, p1 = p0 + v.along;
+        const int32_t c0 = v.codeN[p0], c1 = v.codeN[p1];
+        const bool nOk = NorthAllowed(c0) && NorthAllowed(c1);
+        const bool sOk = SouthAllowed(c0) && SouthAllowed(c1);
+        const size_t n0 = nOk ? p0 + up : p0, n1 = nOk ? p1 + up : p1;
+        const size_t s0 = sOk ? p0 - up : p0, s1 = sOk ? p1 - up : p1;
+        const float big = std::max({delta[p0], delta[p1], delta[n0], delta[n1], delta[s0], delta[s1]});
+        if (big < 1e-6f) {
+            w.rr[r] = 0.0f;
+            continue;
+        }
+        const double dN = (static_cast<double>(w.dEN[r]) + w.dE[r] + w.dE[r + 1] + w.dEN[r + 1]) * 0.25;
+        const double dS = (static_cast<double>(w.dE[r]) + w.dE[r + 1] + w.dES[r] + w.dES[r + 1]) * 0.25;
+        auto mean = [&](const float* a, size_t x0, size_t x1, size_t x2, size_t x3) {
+            return (static_cast<double>(a[x0]) + a[x1] + a[x2] + a[x3]) * 0.25;
+        };
+        const double deltaN = mean(delta, n0, p0, p1, n1), deltaS = mean(delta, p0, p1, s0, s1);
+        const double caN = mean(cAlong, n0, p0, p1, n1), caS = mean(cAlong, p0, p1, s0, s1);
+        const double ccN = mean(cAcross, n0, p0, p1, n1), ccS = mean(cAcross, p0, p1, s0, s1);
+        const double north = (ccN - 2.0 * (w.qC[r] + w.qC[r + 1]) / (4.0 * dN)) * wf(deltaN, dN) *
+                             (caN - ((static_cast<double>(w.pN[r]) + w.p[r]) * 0.5) / dN);
+        const double south = (ccS - 2.0 * (w.qS[r] + w.qS[r + 1]) / (4.0 * dS)) * wf(deltaS, dS) *
+                             (caS - ((static_cast<double>(w.p[r]) + w.pS[r]) * 0.5) / dS);
+        const double ex0 = cAlong[p0] - ((static_cast<double>(w.p[r - 1]) + w.p[r]) * 0.5) / w.dE[r];
+        const double ex1 = cAlong[p1] - ((static_cast<double>(w.p[r]) + w.p[r + 1]) * 0.5) / w.dE[r + 1];
+        const double along = wf(delta[p1], w.dE[r + 1]) * ex1 * ex1 - wf(delta[p0], w.dE[r]) * ex0 * ex0;
+        w.rr[r] = static_cast<float>(-(north - south) / v.dn - along / v.ds);
+    }
+}
+
+void EddyRows(const AxisView& v, int32_t k, int32_t first, int32_t last, int32_t flag,
+              ChainRows& w) {
+    const int32_t m = last - first + 1;
+    const int32_t type = gEddy.eddyType;
+    if (type != 1 && type != 2) {
+        for (int32_t r = 1; r < m; ++r) w.m1[r] = w.m2[r] = w.m3[r] = w.m4[r] = 0.0f;
+        return;
+    }
+    const float* nu = gEddy.eddyViscosity.data();
+    const size_t up = v.across, base = v.At(first, k);
+    const double dx = v.ds, dy = v.dn;
+    for (int32_t r = 1; r < m; ++r) {
+        const size_t p0 = base + (r - 1) * v.along, p1 = p0 + v.along;
+        double m1, m2, m3, m4;
+        if (type == 1) {
+            const double n0 = nu[p0];
+            m1 = m3 = -n0 / (dx * dx);
+            m2 = 2.0 * n0 / (dx * dx) + n0 / (dy * dy);
+            m4 = (n0 / (dy * dy)) * (static_cast<double>(w.pN[r]) - w.p[r] + w.pS[r]);
+        } else {
+            const double nu0 = nu[p0], nu1 = nu[p1];
+            const double nuN0 = NorthAllowed(v.codeN[p0]) ? nu[p0 + up] : nu0;
+            const double nuN1 = NorthAllowed(v.codeN[p1]) ? nu[p1 + up] : nu1;
+            const double nuS0 = SouthAllowed(v.codeN[p0]) ? nu[p0 - up] : nu0;
+            const double nuS1 = SouthAllowed(v.codeN[p1]) ? nu[p1 - up] : nu1;
+            const double nuN = (nuN0 + nu0 + nu1 + nuN1) * 0.25;
+            const double nuS = (nuS0 + nu0 + nu1 + nuS1) * 0.25;
+            const double dP = w.dP[r], f = flag;
+            m1 = -nu0 * dP / (dx * dx);
+            m3 = -nu1 * dP / (dx * dx);
+            m2 = dP * ((nu0 + nu1) / (dx * dx) + (f * nuN + (1.0 - f) * nuS) * 0.5 / (dy * dy));
+            m4 = (dP * 0.5 / dy) *
+                 (((w.pN[r] - (1.0 - f) * w.p[r]) * nuN - (f * w.p[r] - w.pS[r]) * nuS) / dy +
+                  ((static_cast<double>(w.qC[r + 1]) - w.qC[r]) * nuN -
+                   (static_cast<double>(w.qS[r + 1]) - w.qS[r]) * nuS) /
+                      dx);
+        }
+        const double t = w.src[r] >= 1 ? 0.0 : w.nP[r];
+        w.m1[r] = static_cast<float>(m1 * t);
+        w.m2[r] = static_cast<float>(m2 * t);
+        w.m3[r] = static_cast<float>(m3 * t);
+        w.m4[r] = static_cast<float>(m4 * t);
+    }
+}
+
+void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32_t first,
+                    int32_t last, bool central, ChainRows& w) {
+    const int32_t m = last - first + 1;
+    const float* bed = gGrid.bed.data();
+    const size_t up = v.across, base = v.At(first, k);
+    const EquationSettings& e = gEquation;
+    const bool varying = e.depthVaryingExtrapolation == 1 && e.deepWaterTerms;
+    const bool deep = e.deepWaterTerms;
+    const double g = s.g, dt = s.dt, dx = s.dx, dy = s.dy, B3 = s.B3;
+    const double alpha = gPorosity.alpha;
+    for (int32_t r = 1; r < m; ++r) {
+        const size_t p0 = base + (r - 1) * v.along, p1 = p0 + v.along;
+        const bool on = central ? w.DP[r] > 0.0f : bed[p0] < 0.0f;
+        if (!on) {
+            w.da[r] = w.db[r] = w.dc[r] = w.dr[r] = 0.0f;
+            continue;
+        }
+        const double nP = w.nP[r], dP = w.dP[r], DP = w.DP[r], Dx = w.Dx[r], Dy = w.Dy[r];
+        const bool porous = 1.0 - nP >= 0.0001;
+        double fe = e.extrapolationLower;
+        if (varying) fe = -bed[p0] >= e.waterDepthLimit ? e.extrapolationUpper : e.extrapolationLower;
+        double E1 = 1.0 + fe / 2.0, E2 = fe / 2.0;
+        if (porous && gPorosity.noExtrapolation) E1 = 1.0, E2 = 0.0;
+        const double t1 = (static_cast<double>(w.qC[r + 1]) - w.qCo[r + 1]) * E1 - v.GDiff[p1] * E2;
+        const double t2 = (static_cast<double>(w.qS[r + 1]) - w.qSo[r + 1]) * E1 - v.GDiff[p1 - up] * E2;
+        const double t3 = (static_cast<double>(w.qC[r]) - w.qCo[r]) * E1 - v.GDiff[p0] * E2;
+        const double t4 = (static_cast<double>(w.qS[r]) - w.qSo[r]) * E1 - v.GDiff[p0 - up] * E2;
+        // Source differences of internal generation between the face's two points.
+        double s1 = 0.0, s2 = 0.0, s3 = 0.0;
+        const int32_t i = w.src[r], i2 = w.src[r + 1];
+        if (i2 >= 1) {
+            s1 += static_cast<double>(v.sF[i2]) - v.sFPrev[i2];
+            s2 += static_cast<double>(v.sG[i2]) - v.sGPrev[i2];
+            s3 += static_cast<double>(v.sGPrev[i2]) - v.sGPrev2[i2];
+        }
+        if (i >= 1) {
+            s1 -= static_cast<double>(v.sF[i]) - v.sFPrev[i];
+            s2 -= static_cast<double>(v.sG[i]) - v.sGPrev[i];
+            s3 -= static_cast<double>(v.sGPrev[i]) - v.sGPrev2[i];
+        }
+        const double A1 = DP * nP / (12.0 * dx * dt);
+        double G = g * dt * dP * nP / (6.0 * dx * dx) + 1.0 / (12.0 * dt) -
+                   B3 * DP * DP * nP / (dx * dx * dt);
+        if (central) G = static_cast<float>(G);
+        const double H1 = 2.0 * A1 * Dx;
+        const double pE = w.p[r + 1], pC = w.p[r], pW = w.p[r - 1];
+        double dr = (-(pE - pW) * 2.0 * A1 + DP * nP / (12.0 * dy * dt) * (t1 - t2 + t3 - t4)) * Dx +
+                    G * (pE - 2.0 * pC + pW + s1) +
+                    (-dP * g * dt * nP / (6.0 * dx * dy) + DP * DP * B3 * nP / (dx * dy * dt)) *
+                        (t1 - s2 * E1 + s3 * E2 - t2 - t3 + t4) +
+                    Dy * A1 * (t1 + t2 - t3 - t4);
+        double db = -2.0 * G;
+        if (central && porous) db += alpha * (1.0 - nP) * (1.0 - nP) * (1.0 - nP);
+        if (deep) {
+            const double xx1 = (static_cast<double>(w.sE[r + 2]) - 2.0 * w.sE[r + 1] + w.sE[r]) / (dx * dx);
+            const double xx0 = (static_cast<double>(w.sE[r + 1]) - 2.0 * w.sE[r] + w.sE[r - 1]) / (dx * dx);
+            const double yy1 = (static_cast<double>(w.sEN[r + 1]) - 2.0 * w.sE[r + 1] + w.sES[r + 1]) / (dy * dy);
+            const double yy0 = (static_cast<double>(w.sEN[r]) - 2.0 * w.sE[r] + w.sES[r]) / (dy * dy);
+            double xxx = (xx1 - xx0) / dx, xyy = (yy1 - yy0) / dx;
+            const double xx = (xx1 + xx0) * 0.5;
+            if (i >= 1) xxx += v.sXiAlong[i] / (dx * dx), xyy += v.sXiAcross[i] / (dx * dy);
+            if (i2 >= 1) xxx -= v.sXiAlong[i2] / (dx * dx), xyy -= v.sXiAcross[i2] / (dx * dy);
+            const double xy = ((static_cast<double>(w.sEN[r + 1]) - w.sES[r + 1] - w.sEN[r] + w.sES[r]) * 0.5) /
+                              (dx * dy);
+            dr += s.B * g * DP * DP * nP * nP * (Dx * (2.0 * xx + (yy1 + yy0) * 0.5) + Dy * xy + DP * (xxx + xyy));
+        }
+        w.da[r] = static_cast<float>(H1 + G);
+        w.db[r] = static_cast<float>(db);
+        w.dc[r] = static_cast<float>(G - H1);
+        w.dr[r] = static_cast<float>(dr);
+    }
+}
+
+void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
+                    const ChainRows& w, float* Bc, float* Rc) {
+    const int32_t m = last - first + 1;
+    const float* xi = gGrid.xi.data();
+    const size_t base = v.At(first, k);
+    const double f4 = 4.0 * v.ds / gGrid.dt, ratio = static_cast<double>(v.ds) / v.dn;
+    for (int32_t r = 1; r <= m; ++r) {
+        const double c = w.c[r], cc1 = c / (2.0 - c);
+        const int32_t i = w.src[r];
+        const double cP = i >= 1 ? v.sF[i] + v.sFPrev[i] * cc1 : 0.0;
+        const double cQ = i >= 1 ? v.sG[i] + v.sGPrev[i] * cc1 : 0.0;
+        const double bc = (central ? cc1 : c) * f4 * w.por[r];
+        const float bcs = static_cast<float>(bc);
+        Bc[r] = bcs;
+        Rc[r] = static_cast<float>(
+            static_cast<double>(bcs) * xi[base + (r - 1) * v.along] -
+            (static_cast<double>(w.p[r]) - w.p[r - 1]) * cc1 + cP -
+            ((static_cast<double>(w.qC[r]) - w.qS[r]) + cc1 * (static_cast<double>(w.qCo[r]) - w.qSo[r]) - cQ) *
+                ratio);
+    }
+}

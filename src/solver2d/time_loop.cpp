@@ -1,0 +1,229 @@
+#include "solver2d/time_loop.hpp"
+
+#include <omp.h>
+
+#include "output/deterministic.hpp"
+#include "processes/internal_generation.hpp"
+#include "processes/open_boundaries.hpp"
+#include "processes/porosity.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
+#include "data/tsfunc.hpp"
+#include "run/messages.hpp"
+#include "run/progress.hpp"
+#include "run/run_state.hpp"
+#include "solver2d/chains.hpp"
+#include "solver2d/model_state.hpp"
+#include "solver2d/sweeps.hpp"
+
+TimeLoopState gLoop;
+
+namespace {
+
+void StartLoopTasks() {
+    StartTiming(gOverallTiming, kTaskCalculation);
+    StartTiming(gLoop.timing, kTaskSimulationTotal);
+    StartTiming(gLoop.timing, kTaskOtherCalculation);
+}
+
+void StopLoopTasks() {
+    StopTiming(gLoop.timing, kTaskOtherCalculation);
+    StopTiming(gLoop.timing, kTaskSimulationTotal);
+    StopTiming(gOverallTiming, kTaskCalculation);
+}
+
+// One half of a step: the surface estimate for the sweep, its boundary
+// values and depth, the shift of the surface levels, the sweep, and the
+// damping behind it.
+void HalfStep(int32_t axis, int32_t step) {
+    GridState& g = gGrid;
+    float* xiExt = axis == 1 ? g.xiExtX.data() : g.xiExtY.data();
+    float* depthExt = axis == 1 ? g.depthExtX.data() : g.depthExtY.data();
+    if (axis == 1)
+        ExtrapolateSurfaceElevationX(xiExt);
+    else
+        ExtrapolateSurfaceElevationY(xiExt);
+    SetBoundarySurface(axis, xiExt);
+    CalculateDepth(g.J, g.K, depthExt, g.bed.data(), xiExt);
+    ShiftSurfaceLevels();
+
+    const int task = axis == 1 ? kTaskXSweep : kTaskYSweep;
+    StopTiming(gLoop.timing, kTaskOtherCalculation);
+    StartTiming(gLoop.timing, task);
+    const bool flag = gLoop.lineOrderFlag;
+    if (gEquation.convectiveHandle == 0)
+        axis == 1 ? XSweep(flag, step) : YSweep(flag, step);
+    else
+        axis == 1 ? XSweep_New(flag, step) : YSweep_New(flag, step);
+    StopTiming(gLoop.timing, task);
+    StartTiming(gLoop.timing, kTaskOtherCalculation);
+
+    if (gFilter.type > 0) axis == 1 ? CalcFilterX() : CalcFilterY();
+    if (gSponge.spongeType) AbsorpWaveEnergy();
+    CalculateDepth(g.J, g.K, g.depth.data(), g.bed.data(), g.xi.data());
+}
+
+}  // namespace
+
+void CalculateDepth(int32_t J, int32_t K, float* target, const float* bed, const float* surface) {
+    const size_t stride = static_cast<size_t>(J) + 1;
+#pragma omp parallel for schedule(static)
+    for (int32_t k = 0; k <= K; ++k) {
+        const size_t o = k * stride;
+        for (size_t j = 0; j < stride; ++j) target[o + j] = surface[o + j] - bed[o + j];
+    }
+    if (gShoreline.type > 0) SlotCorrection(target, bed);
+}
+
+void ShiftSurfaceLevels() {
+    GridState& g = gGrid;
+    const size_t stride = g.Stride();
+    float* xi = g.xi.data();
+    float* prev = g.xiPrev.data();
+    float* prev2 = g.xiPrev2.data();
+#pragma omp parallel for schedule(static)
+    for (int32_t k = 0; k <= g.K; ++k) {
+        const size_t o = k * stride;
+        for (size_t j = 0; j < stride; ++j) {
+            prev2[o + j] = prev[o + j];
+            prev[o + j] = xi[o + j];
+        }
+    }
+}
+
+namespace {
+
+// The surface at the next half level from the continuity equation over one
+// whole step, each flux taken at the time level the weights give: wA on the
+// newer and 1 - wA on the older flux along the chains, wC and 1 - wC across.
+// axis 1: columns and their y chains (xiExtX); axis 2: rows and x chains.
+void Extrapolate(int32_t axis, float* xiExt) {
+    const GridState& g = gGrid;
+    const bool x = axis == 1;
+    const int32_t lines = x ? g.J : g.K;
+    const size_t stride = g.Stride();
+    const float *P = g.P.data(), *PPrev = g.PPrev.data(), *Q = g.Q.data(), *QPrev = g.QPrev.data();
+    const float* xiPrev = g.xiPrev.data();
+    const float* xi = g.xi.data();
+    const float* por = gPorosity.porosity.data();
+    const int32_t* codeAlong = x ? gChains.codeX.data() : gChains.codeY.data();
+    const int32_t* codeEnds = x ? gChains.codeY.data() : gChains.codeX.data();
+    const float wP = x ? 0.875f : 0.375f, wPo = x ? 0.125f : 0.625f;
+    const float wQ = x ? 0.375f : 0.875f, wQo = x ? 0.625f : 0.125f;
+    const bool slot = gShoreline.type > 0;
+    const bool gen = gGeneration.numberOfRecords > 0;
+    const double dt = g.dt;
+    const float dx = g.dx, dy = g.dy;
+#pragma omp parallel for schedule(static)
+    for (int32_t l = 0; l <= lines; ++l) {
+        const int32_t count = x ? gChains.chainCountY[l] : gChains.chainCountX[l];
+        for (int32_t c = 1; c <= count; ++c) {
+            const ChainPair& ch = x ? gChains.Y(l, c) : gChains.X(l, c);
+            auto at = [&](int32_t i) { return x ? g.At(l, i) : g.At(i, l); };
+            const size_t pTest = x ? at(ch.first) : at(ch.last);
+            if (codeEnds[pTest] >= kCodeLevelBoundary) continue;
+            int32_t from = ch.first + 1, to = ch.last - 1;
+            const bool single = ch.first == ch.last;
+            if (single) {
+                from = to = ch.first;
+            } else {
+                if (codeAlong[at(ch.first)] == 2) from = ch.first;
+                if (codeAlong[at(ch.last)] == 3) to = ch.last;
+            }
+            for (int32_t i = from; i <= to; ++i) {
+                const size_t p = at(i);
+                const int32_t j = x ? l : i, k = x ? i : l;
+                const float Pw = j > 0 ? P[p - 1] : g.PWest[k];
+                const float PwO = j > 0 ? PPrev[p - 1] : g.PWest[k];
+                const float Qs = k > 0 ? Q[p - stride] : g.QSouth[j];
+                const float QsO = k > 0 ? QPrev[p - stride] : g.QSouth[j];
+                float sP = 0.0f, sQ = 0.0f;
+                if (gen) {
+                    const int32_t s = gGeneration.sourceIndex[p];
+                    if (s >= 1) {
+                        sP = wP * gGeneration.sourceP[s] + wPo * gGeneration.sourcePPrev[s];
+                        sQ = wQ * gGeneration.sourceQ[s] + wQo * gGeneration.sourceQPrev[s];
+                    }
+                }
+                const float dPx = (P[p] - Pw) * wP + (PPrev[p] - PwO) * wPo - sP;
+                const float dQy = (Q[p] - Qs) * wQ + (QPrev[p] - QsO) * wQo - sQ;
+                // Along a chain of one point only the flux along the line counts.
+                const float div = single ? (x ? dPx / dx : dQy / dy) : dPx / dx + dQy / dy;
+                const float c = slot ? StorageWidthAt(j, k, xi[p]) : 1.0f;
+                xiExt[p] = static_cast<float>(xiPrev[p] - dt * div / (por[p] * c));
+            }
+        }
+    }
+}
+
+}  // namespace
+
+void ExtrapolateSurfaceElevationX(float* xiExt) { Extrapolate(1, xiExt); }
+void ExtrapolateSurfaceElevationY(float* xiExt) { Extrapolate(2, xiExt); }
+
+void PrepareTimeLoop() {
+    MakeChains();
+    if (gRun.debugLevel == 3) WriteChainTables();
+    CountWaterPoints(gChains.activePoints);
+    SetupSweepBuffers();
+    gLoop.lineOrderFlag = true;
+}
+
+void ComputeStep(int32_t n) {
+    TsReadStep(n);
+    UpdateBoundaryData(n);
+    HalfStep(1, n);
+    HalfStep(2, n);
+}
+
+void Compute(int& exitCode) {
+    GridState& g = gGrid;
+    StartTiming(gOverallTiming, kTaskPreProcessing);
+    InitTiming(gLoop.timing, "2D Wave Simulation", 4);
+    AddTiming(gLoop.timing, kTaskXSweep, "X-sweep");
+    AddTiming(gLoop.timing, kTaskYSweep, "Y-sweep");
+    AddTiming(gLoop.timing, kTaskOtherCalculation, "Other calculation");
+    AddTiming(gLoop.timing, kTaskSimulationTotal, "Total");
+    exitCode = 0;
+
+    PrepareTimeLoop();
+    CreateOutputDeterministic();
+    StartProgress(1, g.timeStepCount, exitCode);
+    if (exitCode < 0) {
+        StopTiming(gOverallTiming, kTaskPreProcessing);
+        return;
+    }
+    WriteLine("");
+    StopTiming(gOverallTiming, kTaskPreProcessing);
+
+    gLoop.lineOrderFlag = true;
+    gLoop.pointSteps = 0.0;
+    gLoop.stepsDone = 0;
+    StartLoopTasks();
+    for (int32_t n = 1; n <= g.timeStepCount; ++n) {
+        gLoop.currentStep = n;
+        gLoop.pointSteps += gChains.activePoints;
+        gLoop.stepsDone += 1;
+        if (n % 100 == 0) WriteLine(Filled("Time step: %", n));
+        ComputeStep(n);
+
+        StopLoopTasks();
+        StartTiming(gOverallTiming, kTaskPostProcessing);
+        WriteOutputDeterministic(n);
+        StopTiming(gOverallTiming, kTaskPostProcessing);
+        StartLoopTasks();
+
+        gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
+        ReportProgress(n, gChains.activePoints, exitCode);
+        if (exitCode < 0) break;
+    }
+    StopLoopTasks();
+
+    StartTiming(gOverallTiming, kTaskPostProcessing);
+    WriteLine("");
+    CloseOutputDeterministic();
+    WriteTimingReport(gLoop.timing);
+    WriteRunStatistics(gOverallTiming, gLoop.stepsDone, gChains.activePoints,
+                       static_cast<int64_t>(gLoop.pointSteps));
+    StopTiming(gOverallTiming, kTaskPostProcessing);
+}

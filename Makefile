@@ -6,7 +6,7 @@ BUILD := build/release
 ASAN_BUILD := build/asan
 FUZZ_BUILD := build/fuzz
 
-.PHONY: all deps test test-asan fuzz clean
+.PHONY: all deps test test-asan fuzz bench clean
 
 all: deps
 	cmake -S . -B $(BUILD) -DCMAKE_BUILD_TYPE=Release >/dev/null
@@ -17,6 +17,11 @@ deps:
 
 test: all
 	ctest --test-dir $(BUILD) --output-on-failure -j $(JOBS)
+
+# The speed of the 2DH time loop: a table of points per second by grid size,
+# sweep family and thread count, beside the bandwidth of a plain copy.
+bench: all
+	$(BUILD)/tools/bwbench/bwbench
 
 # The whole suite under AddressSanitizer and UndefinedBehaviorSanitizer.
 test-asan: deps

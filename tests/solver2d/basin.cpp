@@ -1,5 +1,7 @@
 #include "solver2d/basin.hpp"
 
+#include <omp.h>
+
 #include "data/tsfunc.hpp"
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
@@ -41,7 +43,8 @@ void MakeBasin(const BasinSpec& s) {
     gEquation.extrapolationLower = s.deepWater ? s.extrapolation : 1.0f;
     gPorosity.porosity.assign(g.Points(), 1.0f);
     gSponge.sponge.assign(g.Points(), 1.0f);
-    gProcess.threadCount = s.threads;
+    gProcess.processorCount = omp_get_num_procs();
+    gProcess.maxThreads = omp_get_max_threads();
     SetThreads(s.threads);
     TsReset();
     TsInit(s.steps + 1);

@@ -1,0 +1,131 @@
+// bwbench: how fast the 2DH time loop runs. A flat basin of n x n points
+// with a standing wave is stepped with each sweep family on 1 and 2 threads;
+// the table gives the points computed per CPU second and per wall second
+// (the CPS of the run statistics), next to the bandwidth of a plain copy of
+// arrays of the same size measured in the same run, and the bytes a step
+// moves per point by count of the arrays it reads and writes.
+#include <omp.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "data/tsfunc.hpp"
+#include "processes/friction.hpp"
+#include "processes/internal_generation.hpp"
+#include "processes/open_boundaries.hpp"
+#include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
+#include "run/process.hpp"
+#include "run/timing.hpp"
+#include "solver2d/model_state.hpp"
+#include "solver2d/time_loop.hpp"
+
+namespace {
+
+// A closed basin of n x n points, 10 m deep, 5 m spacing, a standing wave
+// on the diagonal, a Courant number of about 1.
+void MakeBasin(int32_t n, int32_t handle, int32_t steps) {
+    ResetModelState();
+    gPorosity = PorositySettings{};
+    gShoreline = ShorelineSettings{};
+    gSponge = SpongeSettings{};
+    gFilter = FilterSettings{};
+    gFriction = FrictionSettings{};
+    gEddy = EddySettings{};
+    gRollers = RollerSettings{};
+    gGeneration = GenerationState{};
+    gBoundaries = BoundaryState{};
+    GridState& g = gGrid;
+    g.J = g.K = n - 1;
+    g.dx = g.dy = 5.0f;
+    g.timeStepCount = steps;
+    g.bed.assign(g.Points(), -10.0f);
+    for (int32_t k = 0; k <= g.K; ++k)
+        for (int32_t j = 0; j <= g.J; ++j)
+            if (j == 0 || k == 0 || j == g.J || k == g.K) g.bed[g.At(j, k)] = 1.0f;
+    AllocateModelState();
+    gEquation.convectiveHandle = handle;
+    gEquation.extrapolationLower = 1.0f;
+    gPorosity.porosity.assign(g.Points(), 1.0f);
+    const double L = (n - 2) * g.dx, k = M_PI / L * 4.0;
+    g.dt = 0.5;  // a Courant number of about 1
+    for (int32_t kk = 0; kk <= g.K; ++kk)
+        for (int32_t j = 0; j <= g.J; ++j) {
+            const size_t p = g.At(j, kk);
+            if (g.bed[p] > 0.0f) continue;
+            g.xi[p] = g.xiPrev[p] = g.xiPrev2[p] =
+                static_cast<float>(0.1 * std::cos(k * (j - 0.5) * g.dx) * std::cos(k * (kk - 0.5) * g.dy));
+        }
+    CalculateDepth(g.J, g.K, g.depth.data(), g.bed.data(), g.xi.data());
+    TsReset();
+    TsInit(steps + 1);
+}
+
+// Bandwidth in GB/s of copying an array of the given number of floats,
+// counting the bytes read and written, on the given number of threads.
+double CopyBandwidth(size_t floats, int threads) {
+    std::vector<float> a(floats, 1.0f), b(floats, 0.0f);
+    omp_set_num_threads(threads);
+    const int repeats = std::max<int>(3, static_cast<int>(2e8 / floats));
+    const double start = WallSeconds();
+    for (int r = 0; r < repeats; ++r) {
+#pragma omp parallel for schedule(static)
+        for (size_t i = 0; i < floats; ++i) b[i] = a[i] + 0.0f * r;
+    }
+    const double seconds = WallSeconds() - start;
+    volatile float sink = b[floats / 2];
+    (void)sink;
+    return 2.0 * 4.0 * floats * repeats / seconds / 1e9;
+}
+
+// Floats a time step reads and writes per point, by count of the arrays of
+// each pass (extrapolation, boundary surface, depths, shift, assembly into
+// the line buffers, solve), for the two halves together.
+double BytesPerPoint(int32_t handle) {
+    const double extrapolate = 7 + 1, depths = 2 * (2 + 1), shift = 2 + 2;
+    const double assemble = handle == 0 ? 12 + 8 : 12 + 12 + 2;
+    const double solve = handle == 0 ? 8 + 4 + 4 : 12 + 3;
+    return 2.0 * 4.0 * (extrapolate + depths + shift + assemble + solve);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    gProcess.processorCount = omp_get_num_procs();
+    gProcess.maxThreads = omp_get_max_threads();
+    const double scale = argc > 1 ? std::atof(argv[1]) : 1.0;  // a shorter run for tests
+    std::printf("%-11s %-14s %7s %14s %14s %10s %10s %12s\n", "grid", "sweeps", "threads",
+                "points/cpu-s", "points/wall-s", "copy GB/s", "B/point", "traffic GB/s");
+    for (int32_t n : {200, 500, 1000}) {
+        const int32_t steps = std::max(2, static_cast<int32_t>(scale * 4e7 / (double(n) * n)));
+        for (int32_t handle : {0, 1, 2}) {
+            for (int threads : {1, 2}) {
+                MakeBasin(n, handle, steps);
+                SetThreads(threads);
+                PrepareTimeLoop();
+                const double cpu0 = CpuSeconds(), wall0 = WallSeconds();
+                for (int32_t s = 1; s <= steps; ++s) {
+                    ComputeStep(s);
+                    gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
+                }
+                const double cpu = CpuSeconds() - cpu0, wall = WallSeconds() - wall0;
+                const double points = static_cast<double>(gChains.activePoints) * steps;
+                const double copy = CopyBandwidth(gGrid.Points(), threads);
+                const double bytes = BytesPerPoint(handle);
+                const char* name = handle == 0 ? "central" : handle == 1 ? "upwind h=1" : "upwind h=2";
+                char grid[32];
+                std::snprintf(grid, sizeof grid, "%dx%d", n, n);
+                std::printf("%-11s %-14s %7d %14.3e %14.3e %10.2f %10.0f %12.2f\n", grid, name, threads,
+                            points / cpu, points / wall, copy, bytes, points / wall * bytes / 1e9);
+                std::fflush(stdout);
+            }
+        }
+    }
+    return 0;
+}

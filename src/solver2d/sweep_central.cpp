@@ -67,29 +67,59 @@ void AssembleLineCentral(const AxisView& v, const SweepConstants& s, int32_t k, 
         float* BcC = Bc + first - 1;  // BcC[r] is Bc at point first + r - 1
         float* RcC = Rc + first - 1;
         ContinuityRows(v, k, first, last, true, w, BcC, RcC);
+        // Reciprocals once a point and once a sweep; the face loop multiplies.
+        double* __restrict inv = w.uE.data();
+        for (int32_t q = 1; q <= m; ++q) inv[q] = 1.0 / w.dE[q];
+        const double quarter = 0.25 / dx, idt = 1.0 / dt, idy = 1.0 / dy, gdx = g / dx;
+        const float* __restrict pr = w.p.data();
+        const float* __restrict qC = w.qC.data();
+        const float* __restrict qS = w.qS.data();
+        const float* __restrict dEN = w.dEN.data();
+        const float* __restrict dES = w.dES.data();
+        const float* __restrict fac = w.fac.data();
+        const float* __restrict nPr = w.nP.data();
+        const float* __restrict dPr = w.dP.data();
+        const float* __restrict U = w.U.data();
+        const float* __restrict Fr = w.Fr.data();
+        const float* __restrict da = w.da.data();
+        const float* __restrict db = w.db.data();
+        const float* __restrict dc = w.dc.data();
+        const float* __restrict dr = w.dr.data();
+        const float* __restrict m1 = w.m1.data();
+        const float* __restrict m2 = w.m2.data();
+        const float* __restrict m3 = w.m3.data();
+        const float* __restrict m4 = w.m4.data();
+        const float* __restrict rr = w.rr.data();
+        float* __restrict eC = e + first - 1;  // index q is the face first + q - 1
+        float* __restrict bC = b + first - 1;
+        float* __restrict fC = f + first - 1;
+        float* __restrict rC = r + first - 1;
+        float* __restrict sNC = sN + first - 1;
+        float* __restrict sSC = sS + first - 1;
         for (int32_t q = 1; q < m; ++q) {
-            const int32_t j = first + q - 1;
-            const double fac = w.fac[q], nP = w.nP[q], dP = w.dP[q], p = w.p[q];
-            const double uW2 = fac * (0.25 / dx) * (static_cast<double>(w.p[q]) + w.p[q - 1]) / w.dE[q];
-            const double uE2 = fac * (0.25 / dx) * (static_cast<double>(w.p[q]) + w.p[q + 1]) / w.dE[q + 1];
-            const double vN2 = fac * (static_cast<double>(w.qC[q]) + w.qC[q + 1]) /
-                               (static_cast<double>(w.dEN[q]) + 2.0 * dP + w.dEN[q + 1]);
-            const double vS2 = fac * (static_cast<double>(w.qS[q]) + w.qS[q + 1]) /
-                               (static_cast<double>(w.dES[q]) + 2.0 * dP + w.dES[q + 1]);
-            const double por = 1.0 - nP >= 0.0001 ? beta * (1.0 - nP) / dP / nP : 0.0;
-            const double ro = static_cast<double>(w.U[q]) * (w.Fr[q] + por);
-            const double a = w.da[q] - uW2 + w.m1[q];
-            const double cc = w.dc[q] + uE2 + w.m3[q];
-            const double f0 = dP * (g / dx) * nP * nP;
-            e[j] = static_cast<float>(BcC[q] * a - f0);
-            f[j] = static_cast<float>(f0 - BcC[q + 1] * cc);
-            b[j] = static_cast<float>(nP / dt - uW2 + uE2 + (vN2 * w1 - vS2 * w2) / dy + ro + a + cc +
-                                      w.db[q] + w.m2[q]);
-            r[j] = static_cast<float>(p * nP / dt + (vN2 + vS2) * cor * dP * nP -
-                                      (vN2 * w2 - vS2 * w1) * p / dy + a * RcC[q] - cc * RcC[q + 1] +
-                                      w.m4[q] + w.rr[q] + w.dr[q]);
-            sN[j] = static_cast<float>(-vN2 / dy);
-            sS[j] = static_cast<float>(vS2 / dy);
+            const double fc = fac[q], nP = nPr[q], dP = dPr[q], p = pr[q];
+            const double uW2 = fc * quarter * (p + pr[q - 1]) * inv[q];
+            const double uE2 = fc * quarter * (p + pr[q + 1]) * inv[q + 1];
+            const double vN2 = fc * (static_cast<double>(qC[q]) + qC[q + 1]) /
+                               (static_cast<double>(dEN[q]) + 2.0 * dP + dEN[q + 1]);
+            const double vS2 = fc * (static_cast<double>(qS[q]) + qS[q + 1]) /
+                               (static_cast<double>(dES[q]) + 2.0 * dP + dES[q + 1]);
+            const double open = 1.0 - nP;
+            const double por = open >= 0.0001 ? beta * open / (dP * nP) : 0.0;
+            const double ro = static_cast<double>(U[q]) * (Fr[q] + por);
+            const double a = da[q] - uW2 + m1[q];
+            const double cc = dc[q] + uE2 + m3[q];
+            const double f0 = dP * gdx * nP * nP;
+            const double bc0 = BcC[q], bc1 = BcC[q + 1];
+            eC[q] = static_cast<float>(bc0 * a - f0);
+            fC[q] = static_cast<float>(f0 - bc1 * cc);
+            bC[q] = static_cast<float>(nP * idt - uW2 + uE2 + (vN2 * w1 - vS2 * w2) * idy + ro + a + cc +
+                                       db[q] + m2[q]);
+            rC[q] = static_cast<float>(p * nP * idt + (vN2 + vS2) * cor * dP * nP -
+                                       (vN2 * w2 - vS2 * w1) * p * idy + a * RcC[q] - cc * RcC[q + 1] +
+                                       m4[q] + rr[q] + dr[q]);
+            sNC[q] = static_cast<float>(-vN2 * idy);
+            sSC[q] = static_cast<float>(vS2 * idy);
         }
     }
 }

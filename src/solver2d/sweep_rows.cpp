@@ -41,7 +41,7 @@ void ChainRows::Reserve(int32_t points) {
     capacity = points;
     const size_t n = static_cast<size_t>(points) + 3;
     for (auto* r : {&p, &pN, &pS, &qC, &qS, &qCo, &qSo, &sE, &sEN, &sES, &dE, &dEN, &dES, &por,
-                    &c, &dpt, &nP, &dP, &DP, &Dx, &Dy, &U, &Fr, &fac, &da, &db, &dc, &dr, &m1,
+                    &c, &dpt, &D, &gD, &gDS, &nP, &dP, &DP, &Dx, &Dy, &U, &Fr, &fac, &da, &db, &dc, &dr, &m1,
                     &m2, &m3, &m4, &rr})
         r->assign(n, 0.0f);
     src.assign(n, 0);
@@ -110,6 +110,13 @@ SweepConstants MakeSweepConstants(const AxisView& v) {
     s.dt = gGrid.dt;
     s.dx = v.ds;
     s.dy = v.dn;
+    s.a1 = 1.0 / (12.0 * s.dx * s.dt);
+    s.g1 = s.g * s.dt / (6.0 * s.dx * s.dx);
+    s.g2 = 1.0 / (12.0 * s.dt);
+    s.g3 = s.B3 / (s.dx * s.dx * s.dt);
+    s.t0 = 1.0 / (12.0 * s.dy * s.dt);
+    s.x1 = -s.g * s.dt / (6.0 * s.dx * s.dy);
+    s.x2 = s.B3 / (s.dx * s.dy * s.dt);
     return s;
 }
 
@@ -140,39 +147,92 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
     const bool gen = gGeneration.numberOfRecords > 0;
     const size_t up = v.across, base = v.At(first, k);
 
-    for (int32_t r = 1; r <= m; ++r) {
-        const size_t pt = base + (r - 1) * v.along;
-        const int32_t code = v.codeN[pt];
-        const bool nOk = NorthAllowed(code), sOk = SouthAllowed(code);
-        w.p[r] = Fold[pt];
-        w.qC[r] = v.G[pt];
-        w.qS[r] = v.G[pt - up];
-        w.qCo[r] = v.GPrev[pt];
-        w.qSo[r] = v.GPrev[pt - up];
-        w.dE[r] = v.depthExt[pt];
-        w.dEN[r] = nOk ? v.depthExt[pt + up] : w.dE[r];
-        w.dES[r] = sOk ? v.depthExt[pt - up] : w.dE[r];
-        if (deep) {
+    // Point rows. Lines 0 and K are never assembled, so the neighbouring
+    // lines exist; their values are taken where the codes allow, else the
+    // line's own (selects, so that the passes vectorise).
+    const size_t al = v.along;
+    const int32_t* code = v.codeN + base;
+    {
+        float* __restrict p = w.p.data();
+        float* __restrict qC = w.qC.data();
+        float* __restrict qS = w.qS.data();
+        float* __restrict qCo = w.qCo.data();
+        float* __restrict qSo = w.qSo.data();
+        float* __restrict gD = w.gD.data();
+        float* __restrict gDS = w.gDS.data();
+        float* __restrict dE = w.dE.data();
+        float* __restrict dEN = w.dEN.data();
+        float* __restrict dES = w.dES.data();
+        float* __restrict por = w.por.data();
+        float* __restrict dpt = w.dpt.data();
+        float* __restrict D = w.D.data();
+        const float* F0 = Fold + base;
+        const float* G = v.G + base;
+        const float* GP = v.GPrev + base;
+        const float* GD = v.GDiff + base;
+        const float* DE = v.depthExt + base;
+        const float* PO = porosity + base;
+        const float* DP = depth + base;
+        const float* BD = bed + base;
+        for (int32_t r = 1; r <= m; ++r) {
+            const size_t i = (r - 1) * al;
+            const int32_t cd = code[i];
+            const bool nOk = cd == 4 || cd == 2, sOk = cd == 4 || cd == 3;
+            p[r] = F0[i];
+            qC[r] = G[i];
+            qS[r] = G[i - up];
+            qCo[r] = GP[i];
+            qSo[r] = GP[i - up];
+            gD[r] = GD[i];
+            gDS[r] = GD[i - up];
+            const float d = DE[i], dn = DE[i + up], ds = DE[i - up];
+            dE[r] = d;
+            dEN[r] = nOk ? dn : d;
+            dES[r] = sOk ? ds : d;
+            por[r] = PO[i];
+            dpt[r] = DP[i];
+            D[r] = -BD[i];
+        }
+    }
+    if (deep) {
+        for (int32_t r = 1; r <= m; ++r) {
+            const size_t pt = base + (r - 1) * al;
+            const int32_t cd = code[(r - 1) * al];
+            const bool nOk = NorthAllowed(cd), sOk = SouthAllowed(cd);
             w.sE[r] = v.xiExt[pt];
             w.sEN[r] = nOk ? v.xiExt[pt + up] : w.sE[r];
             w.sES[r] = sOk ? v.xiExt[pt - up] : w.sE[r];
         }
-        w.por[r] = porosity[pt];
-        w.c[r] = slot ? StorageWidthAt(v.axis == 1 ? first + r - 1 : k,
-                                       v.axis == 1 ? k : first + r - 1, xiPrev[pt])
-                      : 1.0f;
-        w.dpt[r] = depth[pt];
-        w.src[r] = gen ? gGeneration.sourceIndex[pt] : 0;
     }
-    w.src[0] = w.src[m + 1] = 0;
+    if (slot) {
+        for (int32_t r = 1; r <= m; ++r) {
+            const size_t pt = base + (r - 1) * al;
+            w.c[r] = StorageWidthAt(v.axis == 1 ? first + r - 1 : k, v.axis == 1 ? k : first + r - 1,
+                                    xiPrev[pt]);
+        }
+    } else {
+        for (int32_t r = 1; r <= m; ++r) w.c[r] = 1.0f;
+    }
+    if (gen) {
+        for (int32_t r = 1; r <= m; ++r) w.src[r] = gGeneration.sourceIndex[base + (r - 1) * al];
+        w.src[0] = w.src[m + 1] = 0;
+    }
     // Fluxes of the neighbouring lines at the faces: both points must allow.
-    for (int32_t r = 1; r <= m; ++r) {
-        const size_t pt = base + (r - 1) * v.along;
-        const int32_t j = first + r - 1;
-        const int32_t c0 = v.codeN[pt];
-        const int32_t c1 = j < v.n ? v.codeN[pt + v.along] : c0;
-        w.pN[r] = (NorthAllowed(c0) && NorthAllowed(c1)) ? Fold[pt + up] : w.p[r];
-        w.pS[r] = (SouthAllowed(c0) && SouthAllowed(c1)) ? Fold[pt - up] : w.p[r];
+    {
+        float* __restrict pN = w.pN.data();
+        float* __restrict pS = w.pS.data();
+        const float* p = w.p.data();
+        const float* F0 = Fold + base;
+        for (int32_t r = 1; r <= m; ++r) {
+            const size_t i = (r - 1) * al;
+            const int32_t c0 = code[i];
+            const int32_t c1 = first + r - 1 < v.n ? code[i + al] : c0;
+            const bool nOk = (c0 == 4 || c0 == 2) && (c1 == 4 || c1 == 2);
+            const bool sOk = (c0 == 4 || c0 == 3) && (c1 == 4 || c1 == 3);
+            const float fn = F0[i + up], fs = F0[i - up];
+            pN[r] = nOk ? fn : p[r];
+            pS[r] = sOk ? fs : p[r];
+        }
     }
 
     // Ends: land closes the chain; a level boundary brings its outer flux
@@ -207,21 +267,36 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
     }
 
     // Face rows.
+    {
+        const float* D = w.D.data();
+        const float* por = w.por.data();
+        const float* dE = w.dE.data();
+        float* __restrict nP = w.nP.data();
+        float* __restrict dP = w.dP.data();
+        float* __restrict DP = w.DP.data();
+        float* __restrict Dx = w.Dx.data();
+        const float ds = v.ds;
+        for (int32_t r = 1; r < m; ++r) {
+            nP[r] = (por[r] + por[r + 1]) * 0.5f;
+            dP[r] = (dE[r] + dE[r + 1]) * 0.5f;
+            DP[r] = (D[r] + D[r + 1]) * 0.5f;
+            Dx[r] = (D[r + 1] - D[r]) / ds;
+        }
+    }
     for (int32_t r = 1; r < m; ++r) {
         const size_t pt = base + (r - 1) * v.along, pe = pt + v.along;
-        const float D0 = -bed[pt], D1 = -bed[pe];
+        const float D0 = w.D[r], D1 = w.D[r + 1];
         const float DN0 = NorthAllowed(v.codeN[pt]) ? -bed[pt + up] : D0;
         const float DS0 = SouthAllowed(v.codeN[pt]) ? -bed[pt - up] : D0;
         const float DN1 = NorthAllowed(v.codeN[pe]) ? -bed[pe + up] : D1;
         const float DS1 = SouthAllowed(v.codeN[pe]) ? -bed[pe - up] : D1;
-        w.nP[r] = (w.por[r] + w.por[r + 1]) * 0.5f;
-        w.dP[r] = (w.dE[r] + w.dE[r + 1]) * 0.5f;
-        w.DP[r] = (D0 + D1) * 0.5f;
-        w.Dx[r] = (D1 - D0) / v.ds;
         w.Dy[r] = static_cast<float>(((static_cast<double>(DN0) - DS0) + (static_cast<double>(DN1) - DS1)) *
                                      0.25 / v.dn);
-        w.fac[r] = (gen && (w.src[r] >= 1 || w.src[r + 1] >= 1)) ? 0.0f : 1.0f;
     }
+    if (gen)
+        for (int32_t r = 1; r < m; ++r) w.fac[r] = (w.src[r] >= 1 || w.src[r + 1] >= 1) ? 0.0f : 1.0f;
+    else
+        for (int32_t r = 1; r < m; ++r) w.fac[r] = 1.0f;
 }
 
 void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
@@ -337,36 +412,21 @@ void EddyRows(const AxisView& v, int32_t k, int32_t first, int32_t last, int32_t
     }
 }
 
-void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32_t first,
-                    int32_t last, bool central, ChainRows& w) {
+namespace {
+
+// The time differences of the sources of internal generation between the
+// two points of each face, in the dispersion terms.
+void DispersionSourceRows(const AxisView& v, const SweepConstants& s, int32_t first, int32_t last,
+                          bool central, ChainRows& w) {
     const int32_t m = last - first + 1;
-    const float* bed = gGrid.bed.data();
-    const size_t up = v.across, base = v.At(first, k);
     const EquationSettings& e = gEquation;
     const bool varying = e.depthVaryingExtrapolation == 1 && e.deepWaterTerms;
-    const bool deep = e.deepWaterTerms;
-    const double g = s.g, dt = s.dt, dx = s.dx, dy = s.dy, B3 = s.B3;
-    const double alpha = gPorosity.alpha;
     for (int32_t r = 1; r < m; ++r) {
-        const size_t p0 = base + (r - 1) * v.along, p1 = p0 + v.along;
-        const bool on = central ? w.DP[r] > 0.0f : bed[p0] < 0.0f;
-        if (!on) {
-            w.da[r] = w.db[r] = w.dc[r] = w.dr[r] = 0.0f;
-            continue;
-        }
-        const double nP = w.nP[r], dP = w.dP[r], DP = w.DP[r], Dx = w.Dx[r], Dy = w.Dy[r];
-        const bool porous = 1.0 - nP >= 0.0001;
-        double fe = e.extrapolationLower;
-        if (varying) fe = -bed[p0] >= e.waterDepthLimit ? e.extrapolationUpper : e.extrapolationLower;
-        double E1 = 1.0 + fe / 2.0, E2 = fe / 2.0;
-        if (porous && gPorosity.noExtrapolation) E1 = 1.0, E2 = 0.0;
-        const double t1 = (static_cast<double>(w.qC[r + 1]) - w.qCo[r + 1]) * E1 - v.GDiff[p1] * E2;
-        const double t2 = (static_cast<double>(w.qS[r + 1]) - w.qSo[r + 1]) * E1 - v.GDiff[p1 - up] * E2;
-        const double t3 = (static_cast<double>(w.qC[r]) - w.qCo[r]) * E1 - v.GDiff[p0] * E2;
-        const double t4 = (static_cast<double>(w.qS[r]) - w.qSo[r]) * E1 - v.GDiff[p0 - up] * E2;
-        // Source differences of internal generation between the face's two points.
-        double s1 = 0.0, s2 = 0.0, s3 = 0.0;
         const int32_t i = w.src[r], i2 = w.src[r + 1];
+        if (i < 1 && i2 < 1) continue;
+        const bool on = central ? w.DP[r] > 0.0f : w.D[r] > 0.0f;
+        if (!on) continue;
+        double s1 = 0.0, s2 = 0.0, s3 = 0.0;
         if (i2 >= 1) {
             s1 += static_cast<double>(v.sF[i2]) - v.sFPrev[i2];
             s2 += static_cast<double>(v.sG[i2]) - v.sGPrev[i2];
@@ -377,37 +437,113 @@ void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32
             s2 -= static_cast<double>(v.sG[i]) - v.sGPrev[i];
             s3 -= static_cast<double>(v.sGPrev[i]) - v.sGPrev2[i];
         }
-        const double A1 = DP * nP / (12.0 * dx * dt);
-        double G = g * dt * dP * nP / (6.0 * dx * dx) + 1.0 / (12.0 * dt) -
-                   B3 * DP * DP * nP / (dx * dx * dt);
+        const double nP = w.nP[r], dP = w.dP[r], DP = w.DP[r];
+        const double fe = varying ? (w.D[r] >= e.waterDepthLimit ? e.extrapolationUpper
+                                                                  : e.extrapolationLower)
+                                  : e.extrapolationLower;
+        const bool plain = 1.0 - nP >= 0.0001 && gPorosity.noExtrapolation;
+        const double E1 = plain ? 1.0 : 1.0 + fe * 0.5, E2 = plain ? 0.0 : fe * 0.5;
+        double G = dP * nP * s.g1 + s.g2 - DP * DP * nP * s.g3;
+        if (central) G = static_cast<float>(G);
+        const double cross = dP * nP * s.x1 + DP * DP * nP * s.x2;
+        w.dr[r] = static_cast<float>(w.dr[r] + G * s1 + cross * (-s2 * E1 + s3 * E2));
+    }
+}
+
+// The deep-water terms B g D^2 n^2 (D (xi_xxx + xi_xyy) + D_x (2 xi_xx + xi_yy) + D_y xi_xy)
+// of the extrapolated surface, into dr.
+void DeepWaterRows(const AxisView& v, const SweepConstants& s, int32_t first, int32_t last,
+                   bool central, ChainRows& w) {
+    const int32_t m = last - first + 1;
+    const double dx = s.dx, dy = s.dy, idx2 = 1.0 / (dx * dx), idy2 = 1.0 / (dy * dy);
+    const double idx = 1.0 / dx, idxdy = 1.0 / (dx * dy), Bg = s.B * s.g;
+    const bool gen = gGeneration.numberOfRecords > 0;
+    const float* sE = w.sE.data();
+    const float* sEN = w.sEN.data();
+    const float* sES = w.sES.data();
+    for (int32_t r = 1; r < m; ++r) {
+        const bool on = central ? w.DP[r] > 0.0f : w.D[r] > 0.0f;
+        if (!on) continue;
+        const double xx1 = (static_cast<double>(sE[r + 2]) - 2.0 * sE[r + 1] + sE[r]) * idx2;
+        const double xx0 = (static_cast<double>(sE[r + 1]) - 2.0 * sE[r] + sE[r - 1]) * idx2;
+        const double yy1 = (static_cast<double>(sEN[r + 1]) - 2.0 * sE[r + 1] + sES[r + 1]) * idy2;
+        const double yy0 = (static_cast<double>(sEN[r]) - 2.0 * sE[r] + sES[r]) * idy2;
+        double xxx = (xx1 - xx0) * idx, xyy = (yy1 - yy0) * idx;
+        if (gen) {
+            const int32_t i = w.src[r], i2 = w.src[r + 1];
+            if (i >= 1) xxx += v.sXiAlong[i] * idx2, xyy += v.sXiAcross[i] * idxdy;
+            if (i2 >= 1) xxx -= v.sXiAlong[i2] * idx2, xyy -= v.sXiAcross[i2] * idxdy;
+        }
+        const double xx = (xx1 + xx0) * 0.5;
+        const double xy = ((static_cast<double>(sEN[r + 1]) - sES[r + 1] - sEN[r] + sES[r]) * 0.5) * idxdy;
+        const double nP = w.nP[r], DP = w.DP[r];
+        w.dr[r] = static_cast<float>(
+            w.dr[r] + Bg * DP * DP * nP * nP *
+                          (w.Dx[r] * (2.0 * xx + (yy1 + yy0) * 0.5) + w.Dy[r] * xy + DP * (xxx + xyy)));
+    }
+}
+
+}  // namespace
+
+void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32_t first,
+                    int32_t last, bool central, ChainRows& w) {
+    (void)k;
+    const int32_t m = last - first + 1;
+    const EquationSettings& e = gEquation;
+    const bool varying = e.depthVaryingExtrapolation == 1 && e.deepWaterTerms;
+    const double lower = e.extrapolationLower, upper = e.extrapolationUpper;
+    const float limit = e.waterDepthLimit;
+    const bool noExtrapolation = gPorosity.noExtrapolation;
+    const double alpha = central ? gPorosity.alpha : 0.0;
+    const double a1 = s.a1, g1 = s.g1, g2 = s.g2, g3 = s.g3, t0 = s.t0, x1 = s.x1, x2 = s.x2;
+    const float* __restrict D = w.D.data();
+    const float* __restrict nPr = w.nP.data();
+    const float* __restrict dPr = w.dP.data();
+    const float* __restrict DPr = w.DP.data();
+    const float* __restrict Dxr = w.Dx.data();
+    const float* __restrict Dyr = w.Dy.data();
+    const float* __restrict p = w.p.data();
+    const float* __restrict qC = w.qC.data();
+    const float* __restrict qS = w.qS.data();
+    const float* __restrict qCo = w.qCo.data();
+    const float* __restrict qSo = w.qSo.data();
+    const float* __restrict gD = w.gD.data();
+    const float* __restrict gDS = w.gDS.data();
+    float* __restrict da = w.da.data();
+    float* __restrict db = w.db.data();
+    float* __restrict dc = w.dc.data();
+    float* __restrict dr = w.dr.data();
+    for (int32_t r = 1; r < m; ++r) {
+        // Central sweeps test the face's still water depth, the upwind ones the bed at j.
+        const bool on = central ? DPr[r] > 0.0f : D[r] > 0.0f;
+        const double nP = nPr[r], dP = dPr[r], DP = DPr[r], Dx = Dxr[r], Dy = Dyr[r];
+        const bool porous = 1.0 - nP >= 0.0001;
+        const double fe = varying ? (D[r] >= limit ? upper : lower) : lower;
+        const bool plain = porous && noExtrapolation;
+        const double E1 = plain ? 1.0 : 1.0 + fe * 0.5, E2 = plain ? 0.0 : fe * 0.5;
+        // Time differences of G at the four corners of the face, extrapolated.
+        const double t1 = (static_cast<double>(qC[r + 1]) - qCo[r + 1]) * E1 - gD[r + 1] * E2;
+        const double t2 = (static_cast<double>(qS[r + 1]) - qSo[r + 1]) * E1 - gDS[r + 1] * E2;
+        const double t3 = (static_cast<double>(qC[r]) - qCo[r]) * E1 - gD[r] * E2;
+        const double t4 = (static_cast<double>(qS[r]) - qSo[r]) * E1 - gDS[r] * E2;
+        const double A1 = DP * nP * a1;
+        double G = dP * nP * g1 + g2 - DP * DP * nP * g3;
         if (central) G = static_cast<float>(G);
         const double H1 = 2.0 * A1 * Dx;
-        const double pE = w.p[r + 1], pC = w.p[r], pW = w.p[r - 1];
-        double dr = (-(pE - pW) * 2.0 * A1 + DP * nP / (12.0 * dy * dt) * (t1 - t2 + t3 - t4)) * Dx +
-                    G * (pE - 2.0 * pC + pW + s1) +
-                    (-dP * g * dt * nP / (6.0 * dx * dy) + DP * DP * B3 * nP / (dx * dy * dt)) *
-                        (t1 - s2 * E1 + s3 * E2 - t2 - t3 + t4) +
-                    Dy * A1 * (t1 + t2 - t3 - t4);
-        double db = -2.0 * G;
-        if (central && porous) db += alpha * (1.0 - nP) * (1.0 - nP) * (1.0 - nP);
-        if (deep) {
-            const double xx1 = (static_cast<double>(w.sE[r + 2]) - 2.0 * w.sE[r + 1] + w.sE[r]) / (dx * dx);
-            const double xx0 = (static_cast<double>(w.sE[r + 1]) - 2.0 * w.sE[r] + w.sE[r - 1]) / (dx * dx);
-            const double yy1 = (static_cast<double>(w.sEN[r + 1]) - 2.0 * w.sE[r + 1] + w.sES[r + 1]) / (dy * dy);
-            const double yy0 = (static_cast<double>(w.sEN[r]) - 2.0 * w.sE[r] + w.sES[r]) / (dy * dy);
-            double xxx = (xx1 - xx0) / dx, xyy = (yy1 - yy0) / dx;
-            const double xx = (xx1 + xx0) * 0.5;
-            if (i >= 1) xxx += v.sXiAlong[i] / (dx * dx), xyy += v.sXiAcross[i] / (dx * dy);
-            if (i2 >= 1) xxx -= v.sXiAlong[i2] / (dx * dx), xyy -= v.sXiAcross[i2] / (dx * dy);
-            const double xy = ((static_cast<double>(w.sEN[r + 1]) - w.sES[r + 1] - w.sEN[r] + w.sES[r]) * 0.5) /
-                              (dx * dy);
-            dr += s.B * g * DP * DP * nP * nP * (Dx * (2.0 * xx + (yy1 + yy0) * 0.5) + Dy * xy + DP * (xxx + xyy));
-        }
-        w.da[r] = static_cast<float>(H1 + G);
-        w.db[r] = static_cast<float>(db);
-        w.dc[r] = static_cast<float>(G - H1);
-        w.dr[r] = static_cast<float>(dr);
+        const double pE = p[r + 1], pC = p[r], pW = p[r - 1];
+        const double cross = dP * nP * x1 + DP * DP * nP * x2;
+        const double sum = (-(pE - pW) * 2.0 * A1 + DP * nP * t0 * (t1 - t2 + t3 - t4)) * Dx +
+                           G * (pE - 2.0 * pC + pW) + cross * (t1 - t2 - t3 + t4) +
+                           Dy * A1 * (t1 + t2 - t3 - t4);
+        const double q = 1.0 - nP;
+        const double dbv = -2.0 * G + (porous ? alpha * q * q * q : 0.0);
+        da[r] = on ? static_cast<float>(H1 + G) : 0.0f;
+        db[r] = on ? static_cast<float>(dbv) : 0.0f;
+        dc[r] = on ? static_cast<float>(G - H1) : 0.0f;
+        dr[r] = on ? static_cast<float>(sum) : 0.0f;
     }
+    if (gGeneration.numberOfRecords > 0) DispersionSourceRows(v, s, first, last, central, w);
+    if (e.deepWaterTerms) DeepWaterRows(v, s, first, last, central, w);
 }
 
 void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,

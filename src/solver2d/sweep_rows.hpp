@@ -54,6 +54,7 @@ struct ChainRows {
     int32_t capacity = 0;
     // Point rows.
     std::vector<float> p, pN, pS, qC, qS, qCo, qSo, sE, sEN, sES, dE, dEN, dES, por, c, dpt;
+    std::vector<float> D, gD, gDS;  // still water depth; old time differences of G at k, k-1
     std::vector<int32_t> src;  // source number of each point, 0 for none
     // Face rows.
     std::vector<float> nP, dP, DP, Dx, Dy, U, Fr, fac;
@@ -68,6 +69,14 @@ struct ChainRows {
 struct SweepConstants {
     double g = static_cast<double>(kGravity);
     double B = 0.0, B3 = 0.0, fc = 0.0, dt = 0.0, dx = 0.0, dy = 0.0;
+    // Factors of the dispersion terms, formed once a sweep.
+    double a1 = 0.0;   // 1/(12 dx dt)
+    double g1 = 0.0;   // g dt/(6 dx^2)
+    double g2 = 0.0;   // 1/(12 dt)
+    double g3 = 0.0;   // B3/(dx^2 dt)
+    double t0 = 0.0;   // 1/(12 dy dt)
+    double x1 = 0.0;   // -g dt/(6 dx dy)
+    double x2 = 0.0;   // B3/(dx dy dt)
 };
 SweepConstants MakeSweepConstants(const AxisView& v);
 

@@ -162,6 +162,11 @@ void ExtrapolateSurfaceElevationX(float* xiExt) { Extrapolate(1, xiExt); }
 void ExtrapolateSurfaceElevationY(float* xiExt) { Extrapolate(2, xiExt); }
 
 void PrepareTimeLoop() {
+    InitTiming(gLoop.timing, "2D Wave Simulation", 4);
+    AddTiming(gLoop.timing, kTaskXSweep, "X-sweep");
+    AddTiming(gLoop.timing, kTaskYSweep, "Y-sweep");
+    AddTiming(gLoop.timing, kTaskOtherCalculation, "Other calculation");
+    AddTiming(gLoop.timing, kTaskSimulationTotal, "Total");
     MakeChains();
     if (gRun.debugLevel == 3) WriteChainTables();
     CountWaterPoints(gChains.activePoints);
@@ -179,11 +184,6 @@ void ComputeStep(int32_t n) {
 void Compute(int& exitCode) {
     GridState& g = gGrid;
     StartTiming(gOverallTiming, kTaskPreProcessing);
-    InitTiming(gLoop.timing, "2D Wave Simulation", 4);
-    AddTiming(gLoop.timing, kTaskXSweep, "X-sweep");
-    AddTiming(gLoop.timing, kTaskYSweep, "Y-sweep");
-    AddTiming(gLoop.timing, kTaskOtherCalculation, "Other calculation");
-    AddTiming(gLoop.timing, kTaskSimulationTotal, "Total");
     exitCode = 0;
 
     PrepareTimeLoop();

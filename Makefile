@@ -6,7 +6,7 @@ BUILD := build/release
 ASAN_BUILD := build/asan
 FUZZ_BUILD := build/fuzz
 
-.PHONY: all deps test test-asan fuzz bench clean
+.PHONY: all deps test test-asan fuzz bench demo clean
 
 all: deps
 	cmake -S . -B $(BUILD) -DCMAKE_BUILD_TYPE=Release >/dev/null
@@ -17,6 +17,11 @@ deps:
 
 test: all
 	ctest --test-dir $(BUILD) --output-on-failure -j $(JOBS)
+
+# Builds the engine and runs the example of examples/shoal: waves over a
+# shoal in a flume, with pictures of what it wrote.
+demo: all
+	examples/shoal/run.sh $(CURDIR)/$(BUILD)
 
 # The speed of the 2DH time loop: a table of points per second by grid size,
 # sweep family and thread count, beside the bandwidth of a plain copy.

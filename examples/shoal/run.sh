@@ -1,0 +1,48 @@
+#!/usr/bin/env bash
+# Makes the data files of the shoal example, runs it, and draws what it wrote.
+#   ./run.sh [folder of the built programs]   (default: build/release of the project)
+set -euo pipefail
+here=$(cd "$(dirname "$0")" && pwd)
+root=$(cd "$here/../.." && pwd)
+bin=${1:-$root/build/release}
+bw=$bin/bw
+bwdata=$bin/tools/bwdata/bwdata
+bwplot=$root/tools/bwplot/bwplot
+cd "$here"
+
+/usr/bin/python3 make_inputs.py
+"$bwdata" import-asc bathymetry.asc -o bathymetry.xol2 --title "Flume with a shoal" >/dev/null
+"$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 1000 \
+    --title "Sponge layer" >/dev/null
+"$bwdata" import-csv waves.csv -o waves.xol0 --start "2026-01-01 12:00:00" \
+    --types 100078,999 --units 1000,1000 --title "Incoming wave" >/dev/null
+
+echo "Running bw shoal.bw ..."
+start=$(date +%s.%N)
+"$bw" shoal.bw >/dev/null
+end=$(date +%s.%N)
+printf "Done in %.1f s. The log is %s/shoal.log\n\n" "$(echo "$end - $start" | bc)" "$here"
+grep -A6 "Run Statistics" shoal.log | sed -n 2,6p
+echo
+for f in surface.xol2 gauges.xol0 axis.xol1; do
+    "$bwdata" info "$f" | sed -n '1,3p;/Item name/,/^---/p'
+done
+
+if [ -x "$bwplot" ] && /usr/bin/python3 -c "import matplotlib, netCDF4" 2>/dev/null; then
+    mkdir -p pictures
+    "$bwplot" surface.xol2 --item Bathymetry --mark-line 0,1,0,99 \
+        --mark-points "25,50;60,50;80,50;110,50" --out pictures/bathymetry.png >/dev/null
+    "$bwplot" surface.xol2 --out pictures/surface.png >/dev/null
+    "$bwplot" gauges.xol0 --out pictures/gauges.png >/dev/null
+    "$bwplot" axis.xol1 --out pictures/axis.png >/dev/null
+    echo
+    echo "Pictures: $here/pictures/{bathymetry,surface,gauges,axis}.png"
+fi
+cat <<TEXT
+
+Look further:
+  $bwdata info surface.xol2          what a result file holds
+  ncdump -h surface.xol2             the NetCDF header (items, units, time axis)
+  /usr/bin/python3 -c "import xarray; print(xarray.open_dataset('gauges.xol0'))"
+  $bwplot surface.xol2 --step 40 --out map.png
+TEXT

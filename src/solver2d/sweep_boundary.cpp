@@ -114,6 +114,7 @@ void SetupSweepBuffers() {
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
+    CopyStaticColumns();
 }
 
 void BlowUp(const std::string& text, int32_t i, int32_t j) {

@@ -38,6 +38,8 @@ int32_t TableRow(int32_t b, int32_t j, int32_t k) {
     return (r.orientation == 1 || r.orientation == 3) ? k - r.first[1] : j - r.first[0];
 }
 
+void SweepCentralOn(int32_t axis, bool lineOrderFlag);
+
 void AssembleLineCentral(const AxisView& v, const SweepConstants& s, int32_t k, int32_t flag,
                          ChainRows& w) {
     SweepBuffers& sb = gSweepBuffers;
@@ -135,7 +137,7 @@ void BoundaryRow(const AxisView& v, int32_t k, int32_t first, int32_t last) {
     if (!along) BlowUp("Undetected open point, near (%,%)", gj, gk);
     if (v.codeN[v.At(last, k)] != kCodeLevelBoundary) return;
     const BoundaryTable& t = BoundaryValues(b);
-    float* xi = gGrid.xi.data();
+    float* xi = v.xi;
     for (int32_t i = first; i <= last; ++i)
         xi[v.At(i, k)] = t.Value(TableRow(b, GridJ(v, i, k), GridK(v, i, k)), v.levelColumn);
 }
@@ -160,7 +162,7 @@ void SolveChainCentral(const AxisView& v, const SweepConstants& s, int32_t k, in
     float* C = sb.C.data() + 1;
     float* E = sb.E.data() + 1;
     float* F = sb.F.data() + 1;
-    float* xi = gGrid.xi.data();
+    float* xi = v.xi;
     const size_t up = v.across;
     const int32_t west = v.codeE[v.At(first, k)], east = v.codeE[v.At(last, k)];
     const int32_t gj = GridJ(v, last, k), gk = GridK(v, last, k);
@@ -170,11 +172,11 @@ void SolveChainCentral(const AxisView& v, const SweepConstants& s, int32_t k, in
             BlowUp("One point wide open flux boundary, near (%,%)", gj, gk);
         // A point with no flux of its own: its surface follows from the flux across.
         const size_t pt = v.At(first, k);
-        const int32_t i = SourceAt(pt);
+        const int32_t i = v.source != nullptr ? v.source[pt] : 0;
         const double src = i >= 1 ? static_cast<double>(v.sG[i]) + v.sGPrev[i] : 0.0;
         xi[pt] -= static_cast<float>(((v.G[pt] - src - v.G[pt - up] + v.GPrev[pt] - v.GPrev[pt - up]) *
                                       (s.dt / (4.0 * s.dy))) /
-                                     gPorosity.porosity[pt]);
+                                     v.porosity[pt]);
         return;
     }
 
@@ -317,6 +319,12 @@ void SolveLineCentral(const AxisView& v, const SweepConstants& s, int32_t k) {
 }
 
 void SweepCentral(int32_t axis, bool lineOrderFlag) {
+    if (axis == 2) CopyColumnsIn();
+    SweepCentralOn(axis, lineOrderFlag);
+    if (axis == 2) CopyColumnsOut();
+}
+
+void SweepCentralOn(int32_t axis, bool lineOrderFlag) {
     const AxisView v = MakeAxisView(axis);
     const SweepConstants s = MakeSweepConstants(v);
     const int32_t flag = lineOrderFlag ? 1 : 0;

@@ -77,19 +77,32 @@ AxisView MakeAxisView(int32_t axis) {
         v.sGPrev2 = gen ? s.sourceQPrev2.data() : kNone;
         v.sXiAlong = deep ? s.sourceXiX.data() : kNone;
         v.sXiAcross = deep ? s.sourceXiY.data() : kNone;
+        v.xi = g.xi.data(), v.bed = g.bed.data(), v.porosity = gPorosity.porosity.data();
+        v.depth = g.depth.data(), v.xiPrev = g.xiPrev.data();
+        v.friction = gFriction.resistanceType == 2 ? gFriction.frictionCoef.data() : nullptr;
+        v.nu = gEddy.eddyViscosity.data();
+        v.delta = gRollers.delta.data(), v.cAlong = gRollers.cx.data(), v.cAcross = gRollers.cy.data();
+        v.source = gen ? s.sourceIndex.data() : nullptr;
     } else {
+        ColumnCopies& c = gColumns;
         v.n = g.K;
         v.lines = g.J;
-        v.along = g.Stride();
-        v.across = 1;
+        v.along = 1;
+        v.across = static_cast<size_t>(g.K) + 1;
         v.ds = g.dy;
         v.dn = g.dx;
-        v.F = g.Q.data(), v.FPrev = g.QPrev.data(), v.FDiff = g.qxyt.data(), v.FEdge = g.QSouth.data();
-        v.G = g.P.data(), v.GPrev = g.PPrev.data(), v.GDiff = g.pxyt.data();
-        v.codeN = gChains.codeY.data(), v.codeE = gChains.codeX.data();
+        v.F = c.Q.data(), v.FPrev = c.QPrev.data(), v.FDiff = c.qxyt.data(), v.FEdge = g.QSouth.data();
+        v.G = c.P.data(), v.GPrev = c.PPrev.data(), v.GDiff = c.pxyt.data();
+        v.codeN = c.codeN.data(), v.codeE = c.codeE.data();
         v.chainCount = &gChains.chainCountY, v.chains = &gChains.chainY;
         v.maxChains = gChains.maxChainsY;
-        v.xiExt = g.xiExtY.data(), v.depthExt = g.depthExtY.data();
+        v.xiExt = c.xiExt.data(), v.depthExt = c.depthExt.data();
+        v.xi = c.xi.data(), v.bed = c.bed.data(), v.porosity = c.porosity.data();
+        v.depth = c.depth.data(), v.xiPrev = c.xiPrev.data();
+        v.friction = gFriction.resistanceType == 2 ? c.friction.data() : nullptr;
+        v.nu = c.nu.data();
+        v.delta = c.delta.data(), v.cAlong = c.cy.data(), v.cAcross = c.cx.data();
+        v.source = gen ? c.source.data() : nullptr;
         v.coriolisSign = -1.0;
         v.levelColumn = 1, v.replaceColumn = 3, v.gradientColumn = 5;
         v.endAxis = 2;
@@ -121,7 +134,7 @@ SweepConstants MakeSweepConstants(const AxisView& v) {
 }
 
 void CheckChainDepth(const AxisView& v, int32_t k, int32_t first, int32_t last) {
-    const float* depth = gGrid.depth.data();
+    const float* depth = v.depth;
     for (int32_t j = first; j <= last; ++j) {
         const float d = depth[v.At(j, k)];
         // A not-a-number passes: the comparisons are false for it.
@@ -134,14 +147,13 @@ void CheckChainDepth(const AxisView& v, int32_t k, int32_t first, int32_t last) 
 
 void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
                    ChainRows& w) {
-    const GridState& g = gGrid;
     const int32_t m = last - first + 1;
     w.Reserve(m + 2);
     const float* Fold = central ? v.F : v.FPrev;
-    const float* bed = g.bed.data();
-    const float* depth = g.depth.data();
-    const float* xiPrev = g.xiPrev.data();
-    const float* porosity = gPorosity.porosity.data();
+    const float* bed = v.bed;
+    const float* depth = v.depth;
+    const float* xiPrev = v.xiPrev;
+    const float* porosity = v.porosity;
     const bool slot = gShoreline.type > 0;
     const bool deep = gEquation.deepWaterTerms;
     const bool gen = gGeneration.numberOfRecords > 0;
@@ -214,7 +226,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         for (int32_t r = 1; r <= m; ++r) w.c[r] = 1.0f;
     }
     if (gen) {
-        for (int32_t r = 1; r <= m; ++r) w.src[r] = gGeneration.sourceIndex[base + (r - 1) * al];
+        for (int32_t r = 1; r <= m; ++r) w.src[r] = v.source[base + (r - 1) * al];
         w.src[0] = w.src[m + 1] = 0;
     }
     // Fluxes of the neighbouring lines at the faces: both points must allow.
@@ -312,7 +324,8 @@ void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Cha
             w.Fr[r] = 0.0f;
             continue;
         }
-        const float F = FrictionCoefficientAt(base + (r - 1) * v.along);
+        const float F = v.friction != nullptr ? v.friction[base + (r - 1) * v.along]
+                                              : gFriction.frictionConstant;
         const float h1 = w.dpt[r], h2 = w.dpt[r + 1];
         const float hf = std::sqrt(2.0f / (1.0f / (h1 * h1) + 1.0f / (h2 * h2)));
         if (chezy) {
@@ -331,9 +344,9 @@ void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Chain
         for (int32_t r = 1; r < m; ++r) w.rr[r] = 0.0f;
         return;
     }
-    const float* delta = gRollers.delta.data();
-    const float* cAlong = v.axis == 1 ? gRollers.cx.data() : gRollers.cy.data();
-    const float* cAcross = v.axis == 1 ? gRollers.cy.data() : gRollers.cx.data();
+    const float* delta = v.delta;
+    const float* cAlong = v.cAlong;
+    const float* cAcross = v.cAcross;
     const size_t up = v.across, base = v.At(first, k);
     auto wf = [](double a, double b) { return a / (1.0 - a / b); };
     for (int32_t r = 1; r < m; ++r) {
@@ -375,7 +388,7 @@ void EddyRows(const AxisView& v, int32_t k, int32_t first, int32_t last, int32_t
         for (int32_t r = 1; r < m; ++r) w.m1[r] = w.m2[r] = w.m3[r] = w.m4[r] = 0.0f;
         return;
     }
-    const float* nu = gEddy.eddyViscosity.data();
+    const float* nu = v.nu;
     const size_t up = v.across, base = v.At(first, k);
     const double dx = v.ds, dy = v.dn;
     for (int32_t r = 1; r < m; ++r) {
@@ -549,7 +562,7 @@ void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32
 void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
                     const ChainRows& w, float* Bc, float* Rc) {
     const int32_t m = last - first + 1;
-    const float* xi = gGrid.xi.data();
+    const float* xi = v.xi;
     const size_t base = v.At(first, k);
     const double f4 = 4.0 * v.ds / gGrid.dt, ratio = static_cast<double>(v.ds) / v.dn;
     for (int32_t r = 1; r <= m; ++r) {

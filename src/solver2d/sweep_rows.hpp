@@ -39,6 +39,13 @@ struct AxisView {
     int32_t endAxis = 1;  // FindBoundary axis of the chain ends; the rows take the other
     // Source vectors of internal generation (index = source number).
     const float *sF, *sFPrev, *sG, *sGPrev, *sGPrev2, *sXiAlong, *sXiAcross;
+    // The other fields a sweep reads, in the view's layout.
+    float* xi;
+    const float *bed, *porosity, *depth, *xiPrev;
+    const float* friction;  // the map of the friction coefficient, or none
+    const float* nu;        // eddy viscosity
+    const float *delta, *cAlong, *cAcross;  // rollers
+    const int32_t* source;  // sourceIndex, or none
 
     size_t At(int32_t j, int32_t k) const { return j * along + k * across; }
     const ChainPair& Chain(int32_t k, int32_t c) const {
@@ -47,7 +54,23 @@ struct AxisView {
 };
 
 // The view of the x-sweep (axis 1) or the y-sweep (axis 2) on the model.
+// The y-sweep works on column-major copies of the fields (ColumnCopies), so
+// that its lines, too, are contiguous.
 AxisView MakeAxisView(int32_t axis);
+
+// Column-major copies of the fields the y-sweep reads and writes: value
+// (j,k) at j*(K+1) + k. The fields that never change after the chains are
+// made are copied once (CopyStaticColumns); the others before each y-sweep
+// (CopyColumnsIn), and those the y-sweep writes back after it (CopyColumnsOut).
+struct ColumnCopies {
+    Field bed, porosity, friction, nu;
+    std::vector<int32_t> codeN, codeE, source;
+    Field depth, xiPrev, xi, Q, QPrev, qxyt, P, PPrev, pxyt, xiExt, depthExt, delta, cx, cy;
+};
+extern ColumnCopies gColumns;
+void CopyStaticColumns();
+void CopyColumnsIn();
+void CopyColumnsOut();
 
 // The work rows of one chain, private to the thread that assembles it.
 struct ChainRows {

@@ -62,7 +62,7 @@ void ConvectionTerms(const AxisView& v, int32_t k, int32_t first, int32_t last, 
         bool nearSource = false;
         if (gen)
             for (int32_t i = j - 1; i <= j + 2; ++i)
-                if (i >= 0 && i <= v.n && gGeneration.sourceIndex[v.At(i, k)] >= 1) nearSource = true;
+                if (i >= 0 && i <= v.n && v.source[v.At(i, k)] >= 1) nearSource = true;
         if (nearSource) {
             co[1] -= uW[q] / (2.0 * dx);
             co[2] += (uE[q] - uW[q]) / (2.0 * dx);
@@ -183,7 +183,7 @@ void AssembleLine(const AxisView& v, const SweepConstants& s, int32_t k, int32_t
 // Stores the solution x(1..N) of a chain: surface and flux, and the flux
 // west of the chain.
 void StoreChain(const AxisView& v, int32_t k, int32_t first, int32_t last, const float* x) {
-    float* xi = gGrid.xi.data();
+    float* xi = v.xi;
     for (int32_t j = first; j <= last; ++j) {
         const size_t pt = v.At(j, k);
         xi[pt] = x[2 * (j - first) + 2];
@@ -306,7 +306,15 @@ void SolveLine(const AxisView& v, int32_t k, int thread) {
     }
 }
 
+void SweepUpwindOn(int32_t axis, bool lineOrderFlag);
+
 void SweepUpwind(int32_t axis, bool lineOrderFlag) {
+    if (axis == 2) CopyColumnsIn();
+    SweepUpwindOn(axis, lineOrderFlag);
+    if (axis == 2) CopyColumnsOut();
+}
+
+void SweepUpwindOn(int32_t axis, bool lineOrderFlag) {
     const AxisView v = MakeAxisView(axis);
     const SweepConstants s = MakeSweepConstants(v);
     const int32_t flag = lineOrderFlag ? 1 : 0;

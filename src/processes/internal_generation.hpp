@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "data/xolfile.hpp"
 #include "platform/kvt/kvt.hpp"
 
 struct InternalGenRecord {
@@ -22,6 +23,16 @@ struct InternalGenRecord {
     float lineNew = 0.0f, lineHalf = 0.0f, deepNew = 0.0f, deepHalf = 0.0f;
 };
 
+// The line file of a record whose waveType is not 0, read forward during the
+// run with two records in memory, each np + 1 values.
+struct InternalLineFile {
+    XolFile file;
+    std::vector<float> older, newer;          // item 1, the main value
+    std::vector<float> deepOlder, deepNewer;  // item 2, with Deep_Water_Terms only
+    double olderTime = 0.0;  // seconds from the simulation start of the older record
+    double fileStep = 0.0;   // seconds between the file's records
+};
+
 struct GenerationState {
     int32_t numberOfRecords = 0;  // above 0: internal generation is active
     std::vector<InternalGenRecord> records;
@@ -32,10 +43,15 @@ struct GenerationState {
     std::vector<float> sourceQ, sourceQPrev, sourceQPrev2;
     std::vector<float> sourceXiX, sourceXiY;  // with Deep_Water_Terms only
     int32_t genJ1 = 0, genJ2 = 0, genK1 = 0, genK2 = 0;
+    std::vector<InternalLineFile> lineFiles;  // record r at index r - 1; open for waveType != 0
+    std::vector<float> lineValues, deepValues;  // max(J, K) + 1 values along a line
 };
 extern GenerationState gGeneration;
 
 void SetupInternalGeneration(KvtHandle target);
+// The kind of a record's line from its ends: 1 along k (or a single point),
+// feeding x; 2 along j, feeding y; 3 oblique, feeding nothing.
+int32_t LineKind(const InternalGenRecord& record);
 // The number of the source at grid point p (index into a field), 0 when
 // internal generation is off or the point has none.
 inline int32_t SourceAt(size_t p) {

@@ -1,0 +1,268 @@
+// Internal wave generation: the setup. Each record is a straight line of
+// points between two ends, rounded onto the grid one point for each step
+// along its longer side. Every point of a line, and its neighbour one up in
+// j (a line along k) or in k (a line along j), gets a number in the flat
+// source vectors, so that the line's two rows of points both gain water.
+// A record's values come from a 0-dimensional series (one value for the
+// whole line) or from a line file of np + 1 values, item 1 the main value
+// and item 2 the deep-water value.
+#include "processes/internal_generation.hpp"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdlib>
+#include <new>
+
+#include "data/tsfunc.hpp"
+#include "input/kvt_access.hpp"
+#include "input/model_setup.hpp"
+#include "processes/open_boundaries.hpp"
+#include "run/datetime.hpp"
+#include "run/messages.hpp"
+#include "run/run_state.hpp"
+#include "solver2d/model_state.hpp"
+
+GenerationState gGeneration;
+
+namespace {
+
+constexpr int32_t kHotStartItems = 18;
+
+double SecondsBetween(const DateTime& from, const DateTime& to) {
+    return (static_cast<double>(to.day) - from.day) * 86400.0 + (to.seconds - from.seconds);
+}
+
+// The records' value series: column 1 is the main value, column 2 the deep
+// water value; cubic interpolation, and no warm-up ramp.
+void StoreSeries(InternalGenRecord& r) {
+    const bool deep = gEquation.deepWaterTerms;
+    if (deep && r.itemCount < 2)
+        StopRun("SetupInternalGeneration: the deep water terms need two items in the series");
+    const int32_t count = std::max(r.itemCount, 1);
+    const int32_t methods[2] = {2, 2};
+    std::vector<float> table;
+    ReadTimeSeries0D(r.fileName, count, r.itemNumbers, methods, table);
+    const int32_t rows = gGrid.timeStepCount + 1;
+    std::vector<float> column(static_cast<size_t>(rows));
+    for (int32_t n = 0; n < rows; ++n) column[n] = table[static_cast<size_t>(n) * count];
+    TsAddSeries(r.seriesId, column.data());
+    if (deep) {
+        for (int32_t n = 0; n < rows; ++n) column[n] = table[static_cast<size_t>(n) * count + 1];
+        TsAddSeries(r.deepSeriesId, column.data());
+    }
+}
+
+// One record of the file into the buffers; item 2 only with the deep-water terms.
+void ReadLineRecord(InternalLineFile& l, std::vector<float>& main, std::vector<float>& deep) {
+    XolReadDynamic(l.file, main.data());
+    if (gEquation.deepWaterTerms)
+        XolReadDynamic(l.file, deep.data());
+    else
+        XolSkipDynamic(l.file);
+}
+
+void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
+    l.file = XolOpenRead(r.fileName);
+    XolPrintSummary(l.file);
+    XolFile& f = l.file;
+    if (f.dimension != 1) StopRun("XOL data is not 1D");
+    if (f.noDynamicItems != 2) StopRun("XOL data does not contain the correct number of items");
+    if (f.axes[0].count != r.pointCount + 1)
+        StopRun("XOL data does not have the correct number of grid points (x.dir.)");
+
+    // Times in seconds from the simulation start; a file on a relative axis
+    // counts from the simulation start itself.
+    const GridState& g = gGrid;
+    double fileStart = 0.0;
+    DateTime date;
+    if (f.timeAxisType == kXolTimeCalendar && ParseDateTime(f.startDateTime, date))
+        fileStart = SecondsBetween(g.start, date);
+    if (f.startOffset != static_cast<double>(kDeleteValue)) fileStart += f.startOffset;
+    l.fileStep = f.timeStep;
+    const int32_t records = std::max(f.noTimeSteps, 0);
+    const double fileEnd = fileStart + (records - 1) * l.fileStep;
+    if (records < 1 || fileStart > 0.0 || fileEnd < g.lastStep * g.dt)
+        StopRun("XOL data does not cover the simulation period");
+
+    const size_t points = static_cast<size_t>(r.pointCount) + 1;
+    try {
+        l.older.assign(points, 0.0f);
+        l.newer.assign(points, 0.0f);
+        if (gEquation.deepWaterTerms) {
+            l.deepOlder.assign(points, 0.0f);
+            l.deepNewer.assign(points, 0.0f);
+        }
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
+    // The whole file steps before the start are passed over; the last of
+    // them is the older record, the next the newer one.
+    const int32_t before =
+        l.fileStep > 0.0 ? static_cast<int32_t>(std::floor(-fileStart / l.fileStep)) : 0;
+    for (int32_t m = 0; m < before; ++m) {
+        XolSkipDynamic(f);
+        XolSkipDynamic(f);
+    }
+    ReadLineRecord(l, l.older, l.deepOlder);
+    if (before + 1 < records) {
+        ReadLineRecord(l, l.newer, l.deepNewer);
+    } else {
+        l.newer = l.older;
+        l.deepNewer = l.deepOlder;
+    }
+    l.olderTime = fileStart + before * l.fileStep;
+}
+
+void ReadRecord(KvtHandle parent, int32_t number, InternalGenRecord& r) {
+    const KvtHandle section = KvtOpenSection(parent, Filled("INTERNAL_GEN_DATA_%", number));
+    int32_t first[2] = {0, 0}, last[2] = {0, 0};
+    KvtGetIntegerList(section, "First_Line_Pos", first, 2);
+    KvtGetIntegerList(section, "Last_Line_Pos ", last, 2);
+    KvtGetInteger(section, "Wave_Type", r.waveType);
+    const DataFileRef ref = ReadDataFile(section, 2);
+    const bool twoD = gBasic.numberOfDimensions == 2;
+    if (!twoD) {
+        // The mesh solver takes the one point of the first end.
+        last[0] = last[1] = 0;
+        r.fileName = ref.fileName;
+        r.itemCount = ref.itemCount;
+        r.itemNumbers[0] = ref.itemNumbers[0];
+        r.itemNumbers[1] = ref.itemNumbers[1];
+        r.pointCount = 0;
+        r.pointJ = {first[0]};
+        r.pointK = {first[1]};
+        return;
+    }
+    r.pointCount = std::max(std::abs(first[0] - last[0]), std::abs(first[1] - last[1]));
+    const int32_t np = r.pointCount;
+    const float m = static_cast<float>(std::max(np, 1));
+    const float dj = static_cast<float>(last[0] - first[0]) / m;
+    const float dk = static_cast<float>(last[1] - first[1]) / m;
+    r.pointJ.resize(static_cast<size_t>(np) + 1);
+    r.pointK.resize(static_cast<size_t>(np) + 1);
+    for (int32_t s = 0; s <= np; ++s) {
+        const float fs = static_cast<float>(s);
+        r.pointJ[s] = static_cast<int32_t>(dj * fs + static_cast<float>(first[0]) + 0.5f);
+        r.pointK[s] = static_cast<int32_t>(dk * fs + static_cast<float>(first[1]) + 0.5f);
+    }
+    // The series and the line file are read with the record's own names and
+    // items, which the 2DH model does not keep beyond them.
+    r.fileName = ref.fileName;
+    r.itemCount = ref.itemCount;
+    r.itemNumbers[0] = ref.itemNumbers[0];
+    r.itemNumbers[1] = ref.itemNumbers[1];
+    if (r.waveType == 0) {
+        StoreSeries(r);
+    } else {
+        OpenInternalLineFile(r, gGeneration.lineFiles[number - 1]);
+    }
+}
+
+void LogAssignment(int32_t s, int32_t j, int32_t k, int32_t number, const char* jLabel,
+                   const char* kLabel, const char* mapLabel) {
+    if (gRun.debugLevel != 4) return;
+    WriteLine(std::string("np=") + FormatNumber(s, 6) + " " + jLabel + FormatNumber(j, 6) + " " +
+              kLabel + FormatNumber(k, 6) + " " + mapLabel + FormatNumber(number, 8));
+}
+
+// Gives every point of every line its numbers; the later line's number
+// stands where two lines meet. Returns the count of numbers given out.
+int32_t NumberSources() {
+    GenerationState& s = gGeneration;
+    const GridState& g = gGrid;
+    int32_t n = 0;
+    for (const InternalGenRecord& r : s.records) {
+        const int32_t np = r.pointCount;
+        const int32_t kind = LineKind(r);
+        const bool single = r.pointJ[0] == r.pointJ[np] && r.pointK[0] == r.pointK[np];
+        for (int32_t p = 0; p <= np; ++p) {
+            const int32_t j = r.pointJ[p], k = r.pointK[p];
+            int32_t given = 1;
+            s.sourceIndex[g.At(j, k)] = n + 1;
+            LogAssignment(p, j, k, n + 1, "j=", "k=", "cigl(j,k)=");
+            if (single) {
+                s.sourceIndex[g.At(j + 1, k)] = n + 2;
+                LogAssignment(p, j + 1, k, n + 2, "j+1=", "k=", "cigl(j+1,k)=");
+                s.sourceIndex[g.At(j, k + 1)] = n + 3;
+                LogAssignment(p, j, k + 1, n + 3, "j=", "k+1=", "cigl(j,k+1)=");
+                given = 3;
+            } else if (kind == 1) {
+                s.sourceIndex[g.At(j + 1, k)] = n + 2;
+                LogAssignment(p, j + 1, k, n + 2, "j+1=", "k=", "cigl(j+1,k)=");
+                given = 2;
+            } else if (kind == 2) {
+                s.sourceIndex[g.At(j, k + 1)] = n + 2;
+                LogAssignment(p, j, k + 1, n + 2, "j=", "k+1=", "cigl(j,k+1)=");
+                given = 2;
+            }
+            n += given;
+        }
+    }
+    return n;
+}
+
+// The sources of the earlier run: items 15 to 18 of its state file, with
+// the same numbering since the records are the same.
+void ReadHotStartSources() {
+    GenerationState& s = gGeneration;
+    GridState& g = gGrid;
+    XolFile f = XolOpenRead(gBathymetry.fileName);
+    std::vector<float>* targets[4] = {&s.sourceP, &s.sourceQ, &s.sourcePPrev, &s.sourceQPrev};
+    const size_t count = std::min(static_cast<size_t>(s.sourceCount), g.work.size());
+    for (int32_t item = 1; item <= kHotStartItems; ++item) {
+        XolReadDynamic(f, g.work.data());
+        if (item < 15) continue;
+        std::vector<float>& v = *targets[item - 15];
+        std::copy(g.work.begin(), g.work.begin() + static_cast<ptrdiff_t>(count), v.begin() + 1);
+    }
+    XolClose(f);
+}
+
+}  // namespace
+
+int32_t LineKind(const InternalGenRecord& r) {
+    const int32_t np = r.pointCount;
+    if (r.pointJ[0] == r.pointJ[np]) return 1;
+    if (r.pointK[0] == r.pointK[np]) return 2;
+    return 3;
+}
+
+void SetupInternalGeneration(KvtHandle target) {
+    const KvtHandle section = KvtOpenSection(target, "Internal_Generation");
+    GenerationState& s = gGeneration;
+    s = GenerationState{};
+    KvtGetInteger(section, "Number_Of_Records", s.numberOfRecords);
+    if (s.numberOfRecords <= 0) return;
+    try {
+        s.records.resize(static_cast<size_t>(s.numberOfRecords));
+        s.lineFiles.resize(static_cast<size_t>(s.numberOfRecords));
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
+    for (int32_t i = 1; i <= s.numberOfRecords; ++i) ReadRecord(section, i, s.records[i - 1]);
+    if (gBasic.numberOfDimensions != 2) return;
+
+    const GridState& g = gGrid;
+    try {
+        s.sourceIndex.assign(g.Points(), 0);
+        s.sourceCount = NumberSources();
+        const size_t length = static_cast<size_t>(s.sourceCount) + 1;
+        for (std::vector<float>* v : {&s.sourceP, &s.sourcePPrev, &s.sourcePPrev2, &s.sourceQ,
+                                      &s.sourceQPrev, &s.sourceQPrev2})
+            v->assign(length, 0.0f);
+        if (gEquation.deepWaterTerms) {
+            s.sourceXiX.assign(length, 0.0f);
+            s.sourceXiY.assign(length, 0.0f);
+        }
+        const size_t line = static_cast<size_t>(std::max(g.J, g.K)) + 1;
+        s.lineValues.assign(line, 0.0f);
+        s.deepValues.assign(line, 0.0f);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
+    if (gBathymetry.hotStart) ReadHotStartSources();
+    s.genJ1 = 0;
+    s.genJ2 = g.J;
+    s.genK1 = 0;
+    s.genK2 = g.K;
+}

@@ -1,0 +1,93 @@
+// The slot of the moving shoreline: its storage width and the effective depth
+// over slot and bed, against the closed forms of the integral of the width.
+#include <gtest/gtest.h>
+
+#include <cmath>
+
+#include "processes/shoreline.hpp"
+#include "solver2d/model_state.hpp"
+
+namespace {
+
+constexpr double kWidth = 0.01, kLambda = 100.0, kSlotBottom = -10.0, kMax = 999.0;
+
+double Width(double surface, double bed) {
+    return StorageWidth(surface, -bed, kSlotBottom, kMax, kWidth, kLambda);
+}
+
+TEST(StorageWidth, FullAboveTheBedNarrowingIntoTheSlot) {
+    EXPECT_EQ(Width(-1.0, -1.0), 1.0);  // surface at the bed
+    EXPECT_EQ(Width(0.5, -1.0), 1.0);   // above it
+    // Half a metre into a slot of 9 m: r = 0.5/9.
+    EXPECT_DOUBLE_EQ(Width(-1.5, -1.0), kWidth + (1 - kWidth) * std::exp(-kLambda * 0.5 / 9.0));
+    // Deep in the slot the width tends to w, and it falls all the way.
+    EXPECT_NEAR(Width(-9.9, -1.0), kWidth, 1e-4);
+    EXPECT_LT(Width(-3.0, -1.0), Width(-1.2, -1.0));
+    // A bed at or below the slot's bottom has no slot.
+    EXPECT_EQ(Width(-20.0, -10.0), 1.0);
+    EXPECT_EQ(Width(-20.0, -12.0), 1.0);
+    // A bed far above the slot's bottom measures r against 999 m.
+    EXPECT_DOUBLE_EQ(StorageWidth(1000.0, -1500.0, kSlotBottom, kMax, kWidth, kLambda),
+                     kWidth + (1 - kWidth) * std::exp(-kLambda * 500.0 / 999.0));
+}
+
+class SlotDepth : public testing::Test {
+protected:
+    void SetUp() override {
+        ResetModelState();
+        gShoreline = ShorelineSettings{};
+        gShoreline.type = 1;
+        gGrid.J = 4, gGrid.K = 0;
+        gGrid.landValue = 1.0f;
+    }
+    void TearDown() override { gShoreline = ShorelineSettings{}; }
+    // The corrected depth of a plain depth v over a bed b.
+    double Corrected(float v, float bed) {
+        float target = v;
+        SlotCorrection(&target, &bed);
+        return target;
+    }
+};
+
+TEST_F(SlotDepth, BranchesMeetAtTheBedAndIntegrateTheWidth) {
+    const double hs = -1.0 - kSlotBottom, e = std::exp(-kLambda);
+    const double atBed = hs * ((1 - e) * (1 - kWidth) / kLambda + kWidth);
+    GridState& g = gGrid;
+    g.J = 0;
+    EXPECT_NEAR(Corrected(0.0f, -1.0f), atBed, 1e-6);
+    EXPECT_NEAR(Corrected(1e-6f, -1.0f), atBed, 1e-5);
+    EXPECT_NEAR(Corrected(-1e-6f, -1.0f), atBed, 1e-5);
+    // Above the bed the plain depth adds to the slot's cross-section.
+    EXPECT_NEAR(Corrected(2.0f, -1.0f), 2.0 + atBed, 1e-5);
+    // Below it: the integral of the width from the slot's bottom up to the
+    // surface, checked by a midpoint sum of StorageWidth.
+    const double v = -0.3;
+    double sum = 0.0;
+    const int n = 20000;
+    const double z0 = kSlotBottom, z1 = -1.0 + v;
+    for (int i = 0; i < n; ++i) sum += Width(z0 + (i + 0.5) * (z1 - z0) / n, -1.0);
+    sum *= (z1 - z0) / n;
+    EXPECT_NEAR(Corrected(static_cast<float>(v), -1.0f), sum, 1e-4);
+}
+
+TEST_F(SlotDepth, LandAndBedsBelowTheSlotKeepThePlainDepth) {
+    GridState& g = gGrid;
+    g.J = 2;
+    float bed[3] = {1.0f, 2.0f, -10.5f};  // at the land value, above it, below the slot
+    float depth[3] = {-0.5f, -0.2f, 0.7f};
+    SlotCorrection(depth, bed);
+    EXPECT_EQ(depth[0], -0.5f);
+    EXPECT_EQ(depth[1], -0.2f);
+    EXPECT_EQ(depth[2], 0.7f);
+}
+
+TEST_F(SlotDepth, OffTheStorageWidthIsOne) {
+    gShoreline.type = 0;
+    gGrid.J = 0;
+    gGrid.bed.assign(1, -1.0f);
+    EXPECT_EQ(StorageWidthAt(0, 0, -5.0f), 1.0f);
+    gShoreline.type = 1;
+    EXPECT_LT(StorageWidthAt(0, 0, -5.0f), 0.02f);
+}
+
+}  // namespace

@@ -1,0 +1,138 @@
+// The sponge's damping towards the rest state and the explicit filter's
+// smoothing along the chains, on small grids built in memory.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <functional>
+
+#include "processes/internal_generation.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
+#include "solver2d/chains.hpp"
+#include "solver2d/model_state.hpp"
+
+namespace {
+
+// A basin of water (bed -2) with a frame of land (bed 1) and a still surface.
+void MakeGrid(int32_t J, int32_t K) {
+    ResetModelState();
+    gShoreline = ShorelineSettings{};
+    gGeneration = GenerationState{};
+    gSponge = SpongeSettings{};
+    gFilter = FilterSettings{};
+    GridState& g = gGrid;
+    g.J = J, g.K = K, g.dx = g.dy = 1.0f;
+    g.bed.assign(g.Points(), -2.0f);
+    for (int32_t k = 0; k <= K; ++k)
+        for (int32_t j = 0; j <= J; ++j)
+            if (j == 0 || j == J || k == 0 || k == K) g.bed[g.At(j, k)] = 1.0f;
+    AllocateModelState();
+    for (size_t p = 0; p < g.Points(); ++p) {
+        g.xi[p] = 0.0f;
+        g.depth[p] = g.xi[p] - g.bed[p];
+    }
+    MakeChains();
+    gSponge.sponge.assign(g.Points(), 1.0f);
+}
+
+TEST(Sponge, ACoefficientOf100RemovesNinetyNinePercent) {
+    MakeGrid(6, 4);
+    GridState& g = gGrid;
+    const size_t p = g.At(3, 2), q = g.At(2, 2), land = g.At(0, 2);
+    gSponge.sponge[p] = 100.0f;
+    gSponge.sponge[land] = 100.0f;
+    for (Field* f : {&g.xi, &g.P, &g.Q, &g.PPrev, &g.QPrev, &g.xiPrev, &g.xiPrev2})
+        (*f)[p] = (*f)[q] = (*f)[land] = 0.5f;
+    AbsorpWaveEnergy();
+    for (Field* f : {&g.xi, &g.P, &g.Q, &g.PPrev, &g.QPrev}) {
+        EXPECT_FLOAT_EQ((*f)[p], 0.005f);
+        EXPECT_EQ((*f)[q], 0.5f);     // coefficient 1: untouched
+        EXPECT_EQ((*f)[land], 0.5f);  // land: untouched
+    }
+    EXPECT_EQ(g.xiPrev[p], 0.5f);
+    EXPECT_EQ(g.xiPrev2[p], 0.5f);
+
+    // The references shift the rest state: the surface is drawn towards 1.
+    gOptions.spongeReferenceS = 1.0f;
+    gOptions.spongeReferenceP = -0.5f;
+    g.xi[p] = 0.0f;
+    g.P[p] = 0.5f;
+    AbsorpWaveEnergy();
+    EXPECT_FLOAT_EQ(g.xi[p], 0.99f);
+    EXPECT_FLOAT_EQ(g.P[p], -0.49f);
+    gOptions = OptionSettings{};
+}
+
+class Filter : public testing::Test {
+protected:
+    void SetUp() override {
+        MakeGrid(41, 6);
+        gFilter.type = 1;
+        gFilter.filterCoef.assign(gGrid.Points(), 0.2f);
+    }
+    void TearDown() override { gFilter = FilterSettings{}; }
+    // Sets xi and P along row k = 3 (and xi on the other water rows too) by f(j).
+    void Fill(const std::function<float(int32_t)>& f) {
+        GridState& g = gGrid;
+        for (int32_t k = 0; k <= g.K; ++k)
+            for (int32_t j = 0; j <= g.J; ++j) g.xi[g.At(j, k)] = g.P[g.At(j, k)] = f(j);
+    }
+    double RowAmplitude(const Field& field, int32_t from, int32_t to) {
+        double a = 0.0;
+        for (int32_t j = from; j <= to; ++j) a = std::max(a, static_cast<double>(std::fabs(field[gGrid.At(j, 3)])));
+        return a;
+    }
+};
+
+TEST_F(Filter, AConstantFieldStaysConstant) {
+    Fill([](int32_t) { return 0.7f; });
+    CalcFilterX();
+    CalcFilterY();
+    const GridState& g = gGrid;
+    for (int32_t k = 1; k < g.K; ++k)
+        for (int32_t j = 1; j < g.J; ++j) EXPECT_FLOAT_EQ(g.xi[g.At(j, k)], 0.7f) << j << "," << k;
+}
+
+TEST_F(Filter, AGridScaleZigzagIsDampedAndASmoothWaveHardlyTouched) {
+    Fill([](int32_t j) { return j % 2 == 0 ? 0.1f : -0.1f; });
+    CalcFilterX();
+    // The centre keeps 1 - 4a = 0.9, the two neighbours along the line give
+    // 2a of the opposite sign and the two across it 2a of the same: 0.9 stays.
+    EXPECT_NEAR(RowAmplitude(gGrid.xi, 2, 39), 0.09, 1e-7);
+    EXPECT_NEAR(RowAmplitude(gGrid.P, 2, 38), 0.09, 1e-7);
+    // A checkerboard meets opposite signs all round: 1 - 8a = 0.8 stays.
+    Fill([](int32_t j) { return j % 2 == 0 ? 0.1f : -0.1f; });
+    GridState& g = gGrid;
+    for (int32_t k = 0; k <= g.K; k += 2)
+        for (int32_t j = 0; j <= g.J; ++j) g.xi[g.At(j, k)] = -g.xi[g.At(j, k)];
+    CalcFilterX();
+    EXPECT_NEAR(RowAmplitude(g.xi, 2, 39), 0.08, 1e-7);
+
+    const double pi = std::acos(-1.0);
+    Fill([&](int32_t j) { return static_cast<float>(0.1 * std::sin(2 * pi * j / 40.0)); });
+    CalcFilterX();
+    CalcFilterY();
+    // A wave of 40 points loses 2a(1 - cos(2 pi/40)) = 0.0006 of itself a sweep.
+    for (int32_t j = 3; j <= 37; ++j) {
+        const double expected = 0.1 * std::sin(2 * pi * j / 40.0);
+        EXPECT_NEAR(gGrid.xi[gGrid.At(j, 3)], expected, 2e-4) << j;
+    }
+}
+
+TEST_F(Filter, SmallCoefficientsAndSourcesLeaveTheFieldAlone) {
+    Fill([](int32_t j) { return j % 2 == 0 ? 0.1f : -0.1f; });
+    GridState& g = gGrid;
+    gFilter.filterCoef[g.At(10, 3)] = 0.009f;
+    gGeneration.numberOfRecords = 1;
+    gGeneration.sourceIndex.assign(g.Points(), 0);
+    gGeneration.sourceIndex[g.At(20, 3)] = 1;
+    CalcFilterX();
+    EXPECT_EQ(g.xi[g.At(10, 3)], 0.1f);
+    // The source and its four neighbours are not filtered; the next point is.
+    for (auto [j, k] : {std::pair{20, 3}, {19, 3}, {21, 3}, {20, 2}, {20, 4}})
+        EXPECT_EQ(std::fabs(g.xi[g.At(j, k)]), 0.1f) << j << "," << k;
+    EXPECT_LT(std::fabs(g.xi[g.At(22, 3)]), 0.09f);
+    gGeneration = GenerationState{};
+}
+
+}  // namespace

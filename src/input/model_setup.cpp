@@ -1,9 +1,26 @@
 #include "input/model_setup.hpp"
 
+#include <algorithm>
+
+#include "data/tsfunc.hpp"
 #include "input/kvt_access.hpp"
+#include "output/deterministic.hpp"
+#include "output/output_sections.hpp"
+#include "processes/friction.hpp"
+#include "processes/initial_surface.hpp"
+#include "processes/internal_generation.hpp"
+#include "processes/open_boundaries.hpp"
+#include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
+#include "run/datetime.hpp"
 #include "run/messages.hpp"
+#include "run/progress.hpp"
+#include "solver2d/model_state.hpp"
 
 BasicSettings gBasic;
+BathymetrySettings gBathymetry;
 
 namespace {
 
@@ -19,11 +36,130 @@ void ReadBasicModelParameters(KvtHandle target) {
     KvtGetInteger(section, "OPEN_LOG_FILE_AFTER_RUN", gBasic.openLogFileAfterRun);
 }
 
+// True_land_value and Reference_Level_Shift. The shift lowers the bed of the
+// water points only: the land keeps its level, so that the land value still
+// tells land from water.
+void ReadAreaDescription(KvtHandle target) {
+    const KvtHandle section = KvtOpenSection(target, "Area_Description");
+    GridState& g = gGrid;
+    g.landValue = 0.0f;
+    g.referenceLevelShift = 0.0f;
+    KvtGetReal(section, "True_land_value", g.landValue);
+    KvtGetReal(section, "Reference_Level_Shift", g.referenceLevelShift);
+    if (gBasic.numberOfDimensions != 2) return;
+    g.waterPoints = 0;
+    for (float& b : g.bed) {
+        if (b < g.landValue) {
+            b -= g.referenceLevelShift;
+            ++g.waterPoints;
+        }
+    }
+}
+
+void ReadSimulationPeriod(KvtHandle target) {
+    const KvtHandle section = KvtOpenSection(target, "Simulation_Period");
+    GridState& g = gGrid;
+    int32_t count = 0, warmUp = 0;
+    double dt = 0.0;
+    int32_t start[6] = {0, 0, 0, 0, 0, 0};
+    KvtGetInteger(section, "Time_step_count", count);
+    KvtGetDouble(section, "Time_step_interval", dt);
+    KvtGetInteger(section, "Warm_up_period", warmUp);
+    KvtGetIntegerList(section, "Start_time", start, 6);
+    g.timeStepCount = count;
+    g.lastStep = count - 1;
+    g.dt = dt;
+    g.warmUpPeriod = warmUp;
+    g.start = MakeDateTime(start[0], start[1], start[2], start[3], start[4], start[5]);
+    gProgress.simulationStart = g.start;
+    gProgress.timeStep = dt;
+    // One row of every series for each step of the run, step 0 included.
+    TsInit(count + 1);
+}
+
+void ReadOptionParameters(KvtHandle target) {
+    const KvtHandle section = KvtOpenSection(target, "OPTION_PARAMETERS");
+    OptionSettings& o = gOptions;
+    // The sponge setup has put the references to 0; every other option
+    // starts from its default here.
+    const float s = o.spongeReferenceS, p = o.spongeReferenceP, q = o.spongeReferenceQ;
+    o = OptionSettings{};
+    o.spongeReferenceS = s, o.spongeReferenceP = p, o.spongeReferenceQ = q;
+    KvtGetReal(section, "Sponge_Reference_s", o.spongeReferenceS);
+    KvtGetReal(section, "Sponge_Reference_p", o.spongeReferenceP);
+    KvtGetReal(section, "Sponge_Reference_q", o.spongeReferenceQ);
+    KvtGetInteger(section, "DAES_method", o.daesMethod);
+    KvtGetInteger(section, "type_of_supg", o.typeOfSupg);
+    KvtGetDouble(section, "supg_coefficient", o.supgCoefficient);
+    KvtGetDouble(section, "interpolation_type", o.interpolationType);
+    std::string editor = o.nameOfTextEditor;
+    KvtGetString(section, "Name_of_Text_Editor", editor, 256);
+    o.nameOfTextEditor = std::string(TrimRight(editor));
+    KvtGetInteger(section, "HUD_update_2DH", o.hudUpdate2DH);
+    KvtGetInteger(section, "HUD_update_1DH", o.hudUpdate1DH);
+    KvtGetDouble(section, "minimum_depth", o.minimumDepth);
+    gProgress.updateInterval = o.hudUpdate2DH;
+}
+
+// The processes and outputs that this version reads and checks but cannot
+// run yet end the run here, after the whole file has been read, so that the
+// log holds every setting and nothing runs half.
+void StopOnUnavailable() {
+    if (gRollers.type == 1)
+        StopRun("Wave breaking by surface rollers is not yet available in this version");
+    if (gEddy.eddyType == 2)
+        StopRun("Eddy viscosity of the Smagorinsky type is not yet available in this version");
+    if (gGeneration.numberOfRecords > 0)
+        StopRun("Internal wave generation is not yet available in this version");
+    if (const char* name = UnavailableOutput())
+        StopRun(std::string(name) + " is not yet available in this version");
+}
+
 }  // namespace
+
+DataFileRef ReadDataFile(KvtHandle parent, int32_t maxItems) {
+    const KvtHandle section = KvtOpenSection(parent, "DATA_FILE");
+    DataFileRef ref;
+    std::string name;
+    KvtGetFilename(section, "File_name", name, 256);
+    ref.fileName = std::string(TrimRight(name));
+    KvtGetInteger(section, "Item_Count", ref.itemCount);
+    ref.itemCount = std::clamp(ref.itemCount, 0, std::min(maxItems, 15));
+    // The first number selects the item, so it is read even for a count of 0.
+    KvtGetIntegerList(section, "Item_Numbers", ref.itemNumbers, std::max(ref.itemCount, 1));
+    return ref;
+}
 
 void ReadModelSetup(KvtHandle file, const std::string& /*fileName*/) {
     const KvtHandle target = KvtOpenTarget(file, kModelTarget);
     ReadBasicModelParameters(target);
-    // The sections of the bathymetry, area, period, equations, processes and
-    // outputs follow here in their fixed order as their readers are added.
+    const bool twoD = gBasic.numberOfDimensions == 2;
+    ReadBathymetry(target);
+    ReadAreaDescription(target);
+    ReadSimulationPeriod(target);
+    SetupEquation(target);
+    ReadSolutionParameters(target);
+    SetupMovingShoreline(target);
+
+    SetupBottomFriction(target);
+    SetupWaveBreaking(target);
+    SetupExplicitFilter(target);
+    SetupEddyViscosity(target);
+    SetupPorosity(target);
+    SetupSpongeLayer(target);
+    // The mesh solver's own sections (its boundaries, generation lines and
+    // outputs) are read with its file, which this version does not write.
+    if (!twoD) StopRun("The 1DH mesh solver is not yet available in this version");
+    SetupInitialSurface(target);
+
+    SetupOpenBoundaries(target);
+    SetupInternalGeneration(target);
+
+    SetupOutputDeterministic2D(target);
+    SetupOutputStatistic2D(target);
+    SetupOutputDisturbance2D(target);
+    SetupOutputHotstart2D(target);
+
+    ReadOptionParameters(target);
+    StopOnUnavailable();
 }

@@ -1,5 +1,8 @@
 // The model reader: walks the model file's target once, from top to bottom,
-// in a fixed order, reading every setting into the model's records.
+// in a fixed order, reading every setting into the model's records. Later
+// sections need what earlier ones fixed: the grid comes from the bathymetry,
+// the number of steps sizes the series, and the state arrays exist before
+// the maps and the initial surface are read into them.
 #pragma once
 
 #include <cstdint>
@@ -17,6 +20,36 @@ struct BasicSettings {
 };
 extern BasicSettings gBasic;
 
-// Reads the whole model setup from the opened parameter file; fileName is
-// its path. Ends with the number of dimensions and all settings known.
+// Bathymetry_Selection: the bathymetry file, which with a hot start is also
+// the state of the earlier run.
+struct BathymetrySettings {
+    bool hotStart = false;
+    std::string fileName;  // full path, trimmed
+    int32_t itemCount = 0;
+    int32_t itemNumbers[15] = {};
+};
+extern BathymetrySettings gBathymetry;
+
+// The name, item count and item numbers of a DATA_FILE section.
+struct DataFileRef {
+    std::string fileName;  // full path, trimmed
+    int32_t itemCount = 0;
+    int32_t itemNumbers[15] = {};
+    int32_t Item() const { return itemNumbers[0]; }  // the number that selects the item
+};
+
+// Reads the reader's whole model setup from the opened parameter file;
+// fileName is its path. Ends with the number of dimensions and all settings
+// known, or stops the run.
 void ReadModelSetup(KvtHandle file, const std::string& fileName);
+
+// The sub-section DATA_FILE of parent: File_name, Item_Count (cut to
+// maxItems) and the first Item_Count numbers of Item_Numbers.
+DataFileRef ReadDataFile(KvtHandle parent, int32_t maxItems);
+
+// Bathymetry_Selection: the grid, the map frame and bed.
+void ReadBathymetry(KvtHandle target);
+// Equation_Parameters; with two dimensions it allocates the state arrays.
+void SetupEquation(KvtHandle target);
+// SOLUTION_PARAMETERS.
+void ReadSolutionParameters(KvtHandle target);

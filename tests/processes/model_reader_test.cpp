@@ -1,0 +1,233 @@
+// The model reader in-process on small complete model files: what the grid,
+// the equations, the process records and the start state hold afterwards.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <cstdlib>
+
+#include "data/tsfunc.hpp"
+#include "data/xolfile.hpp"
+#include "input/kvt_access.hpp"
+#include "input/model_setup.hpp"
+#include "processes/friction.hpp"
+#include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
+#include "run/progress.hpp"
+#include "run/units.hpp"
+#include "solver2d/model_state.hpp"
+#include "support/model_builder.hpp"
+#include "support/test_support.hpp"
+
+namespace {
+
+using Sections = std::map<std::string, std::string>;
+
+// A 6 x 4 grid of 2 m by 3 m: bed -1 - j/10 in the water, land (bed 1) along
+// k = 3, and one point exactly at the land value 0.5.
+std::vector<float> Bed() {
+    std::vector<float> bed(7 * 5);
+    for (int k = 0; k <= 4; ++k)
+        for (int j = 0; j <= 6; ++j) bed[k * 7 + j] = k == 3 ? 1.0f : -1.0f - 0.1f * j;
+    bed[2 * 7 + 4] = 0.5f;
+    return bed;
+}
+
+// A map file of several items, item n holding base + n at every point.
+void WriteItems(const std::string& path, const bwtest::MapSpec& spec, int items, float base,
+                int dataType = 0) {
+    XolFile f = XolCreateHeader("Test map", items, 2);
+    for (int n = 1; n <= items; ++n) XolSetItem(f, n, 100079, "Item " + std::to_string(n), 1000);
+    XolSetAxis(f, 1, spec.dx, 0.0f, spec.J + 1);
+    XolSetAxis(f, 2, spec.dy, 0.0f, spec.K + 1);
+    XolSetCalendarAxis(f, 1.0, "2000-01-01 00:00:00");
+    XolSetDataType(f, dataType);
+    XolSetProjection(f, "NON-UTM", 0.0, 0.0, 0.0);
+    XolCreateFile(f, path);
+    std::vector<float> v(static_cast<size_t>(spec.J + 1) * (spec.K + 1));
+    for (int n = 1; n <= items; ++n) {
+        std::fill(v.begin(), v.end(), base + n);
+        if (n == 2 && dataType == 11) v = Bed();  // a state file holds the bed as item 2
+        XolWriteDynamic(f, v.data());
+    }
+    XolClose(f);
+}
+
+class ModelReader : public testing::Test {
+protected:
+    bwtest::TempDir dir;
+    bwtest::MapSpec spec;
+    KvtHandle file = 0;
+    void SetUp() override {
+        spec.J = 6, spec.K = 4, spec.dx = 2.0f, spec.dy = 3.0f;
+        bwtest::WriteMapFile(dir / "bed.xol2", spec, Bed());
+        ResetModelState();
+        TsReset();
+        setenv("TRF", "HUD", 1);  // stop texts go to standard error, where death tests read them
+    }
+    void TearDown() override {
+        unsetenv("TRF");
+        if (file != 0) kvtClose(&file);
+        if (gKvtAccess.logUnit > 0) ReleaseUnit(gKvtAccess.logUnit);
+        gKvtAccess = KvtAccessState{};
+        TsReset();
+    }
+    // Writes the model with the given sections and reads it, with a log.
+    void Read(const Sections& sections, const std::string& bathymetry = "bed.xol2") {
+        bwtest::WriteFile(dir / "m.bw", bwtest::ModelText(bathymetry, sections));
+        file = KvtOpenFile(dir / "m.bw", true);
+        ReadModelSetup(file, dir / "m.bw");
+        FlushUnits();
+    }
+    std::string Log() {
+        FlushUnits();
+        return bwtest::ReadFile(dir / "m.log");
+    }
+    float At(const Field& f, int j, int k) { return f[gGrid.At(j, k)]; }
+};
+
+TEST_F(ModelReader, GridPeriodAndTheReferenceLevelShift) {
+    Read({{"Area_Description", "True_land_value = 0.5\nReference_Level_Shift = 1\n"},
+          {"Simulation_Period", "Time_step_count = 20\nTime_step_interval = 0.25\n"
+                                "Warm_up_period = 4\nStart_time = 2004, 2, 29, 23, 59, 30\n"}});
+    const GridState& g = gGrid;
+    EXPECT_EQ(g.J, 6);
+    EXPECT_EQ(g.K, 4);
+    EXPECT_EQ(g.dx, 2.0f);
+    EXPECT_EQ(g.dy, 3.0f);
+    EXPECT_EQ(g.projection, "NON-UTM");
+    // Water points are lowered by 1; land and the point at the land value are not.
+    EXPECT_FLOAT_EQ(At(g.bed, 2, 1), -2.2f);
+    EXPECT_EQ(At(g.bed, 2, 3), 1.0f);
+    EXPECT_EQ(At(g.bed, 4, 2), 0.5f);
+    EXPECT_EQ(g.waterPoints, 7 * 4 - 1);
+    EXPECT_EQ(g.timeStepCount, 20);
+    EXPECT_EQ(g.lastStep, 19);
+    EXPECT_EQ(g.dt, 0.25);
+    EXPECT_EQ(g.warmUpPeriod, 4);
+    EXPECT_EQ(DateTimeText(g.start), "2004-02-29 23:59:30");
+    EXPECT_EQ(DateTimeText(gProgress.simulationStart), "2004-02-29 23:59:30");
+    EXPECT_EQ(gProgress.timeStep, 0.25);
+    EXPECT_EQ(gTs.tsSteps, 21);  // steps 0..20
+    // The state exists, the fluxes at their start value.
+    EXPECT_EQ(g.P.size(), g.Points());
+    EXPECT_EQ(At(g.P, 3, 2), 1e-10f);
+}
+
+TEST_F(ModelReader, TheSelectedItemOfTheBathymetryStays) {
+    WriteItems(dir / "three.xol2", spec, 4, -10.0f);
+    Read({{"Bathymetry_Selection",
+           "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"}});
+    EXPECT_EQ(At(gGrid.bed, 5, 2), -7.0f);
+    EXPECT_FALSE(gBathymetry.hotStart);
+    EXPECT_EQ(gBathymetry.itemNumbers[0], 3);
+}
+
+TEST_F(ModelReader, EquationSettingsAndTheirForcedValues) {
+    Read({{"Equation_Parameters", "Deep_Water_Terms = false\nDispersion_Factor = 5\n"},
+          {"SOLUTION_PARAMETERS",
+           "Convective_terms_handle = 2\nTime_extrapolation_factor_lower = 0.3\n"
+           "Include_depth_varying_time_extrapolation = 1\nWater_depth_limit = 4\n"}});
+    EXPECT_EQ(gEquation.dispersionFactor, 0.0f);
+    EXPECT_EQ(gEquation.extrapolationLower, 1.0f);
+    EXPECT_EQ(gEquation.depthVaryingExtrapolation, 0);
+    EXPECT_EQ(gEquation.convectiveHandle, 2);
+    EXPECT_EQ(gEquation.waterDepthLimit, 4.0f);
+    const std::string log = Log();
+    EXPECT_NE(log.find("    Dispersion_Factor : 5\n"), std::string::npos);  // as read
+    EXPECT_NE(log.find("    Time_extrapolation_factor_upper : 0 (default)\n"), std::string::npos);
+
+    for (const char* edge : {"-0.333", "0.166"}) {
+        ResetModelState();
+        TsReset();
+        kvtClose(&file);
+        Read({{"Equation_Parameters",
+               std::string("Deep_Water_Terms = true\nDispersion_Factor = ") + edge + "\n"}});
+        EXPECT_EQ(gEquation.dispersionFactor, std::stof(edge));
+        EXPECT_EQ(gEquation.extrapolationLower, 0.0f);
+    }
+}
+
+TEST_F(ModelReader, ProcessSettings) {
+    bwtest::WriteMapFile(dir / "por.xol2", spec, bwtest::Constant(spec, 0.5f));
+    Read({{"MOVING_SHORELINE", "type = 1\ndepth = -4\nwidth = 0.02\n"},
+          {"Bottom_Friction", "Resistance_Type = 1\nFormulation = 1\nConstant_Value = 40\n"},
+          {"EXPLICIT_FILTERING", "type = 1\n"},
+          {"EDDY_VISCOSITY", "Type = 1\nFormulation = 0\nBase = 0\nConstant_Value = 0.3\n"},
+          {"Porosity", "Porosity_Type = true\nParticle_Diameter = 0.1\n" +
+                           bwtest::DataFileSection("por.xol2")},
+          {"OPTION_PARAMETERS", "Sponge_Reference_s = 1.5\nHUD_update_2DH = 7\n"}});
+    EXPECT_EQ(gShoreline.type, 1);
+    EXPECT_EQ(gShoreline.slotDepth, -4.0);
+    EXPECT_EQ(gShoreline.width, 0.02);
+    EXPECT_EQ(gShoreline.lambda, 100.0);
+    EXPECT_EQ(gFriction.frictionConstant, 9.81f / 1600.0f);
+    EXPECT_EQ(gFilter.filterCoef, std::vector<float>(gGrid.Points(), 0.2f));
+    // Base 0: the field is there and the sweeps act as if it were off.
+    EXPECT_EQ(gEddy.eddyType, -1);
+    EXPECT_EQ(gEddy.eddyViscosity, std::vector<float>(gGrid.Points(), 0.3f));
+    EXPECT_FLOAT_EQ(gPorosity.alpha, 1.4e-06f * 1000.0f / 0.01f);
+    EXPECT_FLOAT_EQ(gPorosity.beta, 28.0f);
+    EXPECT_EQ(At(gPorosity.porosity, 3, 1), 0.5f);
+    EXPECT_EQ(gSponge.sponge, std::vector<float>(gGrid.Points(), 1.0f));
+    EXPECT_EQ(gOptions.spongeReferenceS, 1.5f);
+    EXPECT_EQ(gOptions.spongeReferenceP, 0.0f);
+    EXPECT_EQ(gProgress.updateInterval, 7);
+    EXPECT_EQ(gOptions.nameOfTextEditor, "Notepad.exe");
+    // The slot reaches the initial depth: above the bed it adds its cross-section.
+    const double hs = -1.2 + 4.0;
+    const double slot = hs * ((1 - std::exp(-100.0)) * 0.98 / 100.0 + 0.02);
+    EXPECT_NEAR(At(gGrid.depth, 2, 1), 1.2 + slot, 1e-5);
+}
+
+TEST_F(ModelReader, AColdStartPutsOneLevelEverywhere) {
+    Read({{"SURFACE_ELEVATION", "SURFACE_TYPE = 0\nConstant_Value = 0.5\n"}});
+    const GridState& g = gGrid;
+    for (auto [j, k] : {std::pair{2, 1}, {2, 3}}) {  // water and land alike
+        EXPECT_EQ(At(g.xi, j, k), 0.5f);
+        EXPECT_EQ(At(g.xiPrev, j, k), 0.5f);
+        EXPECT_EQ(At(g.xiPrev2, j, k), 0.5f);
+        EXPECT_FLOAT_EQ(At(g.depth, j, k), 0.5f - At(g.bed, j, k));
+    }
+}
+
+TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
+    WriteItems(dir / "hot.xol2", spec, 18, 100.0f, 11);
+    Read({{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection("hot.xol2")},
+          {"SURFACE_ELEVATION", "-"}});
+    const GridState& g = gGrid;
+    EXPECT_EQ(g.bed, Bed());
+    EXPECT_EQ(At(g.xi, 1, 1), 103.0f);
+    EXPECT_EQ(At(g.P, 1, 1), 104.0f);
+    EXPECT_EQ(At(g.Q, 1, 1), 105.0f);
+    EXPECT_EQ(At(g.xiPrev, 1, 1), 106.0f);
+    EXPECT_EQ(At(g.QPrev, 1, 1), 108.0f);
+    EXPECT_EQ(At(g.qxyt, 1, 1), 110.0f);
+    EXPECT_EQ(At(g.xiPrev2, 1, 1), 1e-10f);  // not in the file
+    EXPECT_FLOAT_EQ(At(g.depth, 1, 1), 103.0f + 1.1f);
+    EXPECT_EQ(Log().find("SURFACE_ELEVATION"), std::string::npos);
+}
+
+using ModelReaderDeathTest = ModelReader;
+
+TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
+    WriteItems(dir / "cold.xol2", spec, 3, 0.0f);
+    EXPECT_EXIT(Read({{"Bathymetry_Selection",
+                       "Hot_Start = true\n" + bwtest::DataFileSection("cold.xol2")}}),
+                testing::ExitedWithCode(1), "XOL data is not hot start data");
+    EXPECT_EXIT(Read({}, "absent.xol2"), testing::ExitedWithCode(1), "XOL file can not be opened");
+    bwtest::MapSpec bare = spec;
+    bare.projection = "";
+    bwtest::WriteMapFile(dir / "bare.xol2", bare, Bed());
+    EXPECT_EXIT(Read({}, "bare.xol2"), testing::ExitedWithCode(1),
+                "XOL data does not contain projection information");
+    bwtest::MapSpec wide = spec;
+    wide.J = 7;
+    bwtest::WriteMapFile(dir / "wide.xol2", wide, bwtest::Constant(wide, 1.0f));
+    EXPECT_EXIT(Read({{"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("wide.xol2")}}),
+                testing::ExitedWithCode(1),
+                "XOL data does not have the correct number of grid points \\(x.dir.\\)");
+}
+
+}  // namespace

@@ -1,7 +1,9 @@
 // Bathymetry_Selection: the bathymetry file gives the grid (its axes), the
 // map frame (its projection block) and the bed level. With a hot start the
 // same file is the state of an earlier run, whose second item is the bed.
+#include <algorithm>
 #include <new>
+#include <vector>
 
 #include "data/geoframe.hpp"
 #include "data/xolfile.hpp"
@@ -33,6 +35,13 @@ void OpenGridFrame(const XolFile& f) {
     if (status != 0) StopRun("Unable to initialize the cartography module");
     g.longitude = longitude;
     g.latitude = latitude;
+}
+
+size_t ItemSize(const XolFile& f) {
+    size_t size = 1;
+    for (int d = 0; d < f.dimension && d < 4; ++d)
+        size *= static_cast<size_t>(std::max(f.axes[d].count, 1));
+    return size;
 }
 
 }  // namespace
@@ -77,14 +86,23 @@ void ReadBathymetry(KvtHandle target) {
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
+    // An item fills the file's whole grid, which with one dimension may be
+    // more than the model's line: read into room for it, keep the line.
+    std::vector<float> item;
+    try {
+        item.assign(std::max(ItemSize(f), g.Points()), 0.0f);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
     if (!b.hotStart) {
         // Items 1 to the selected one, so that the selected item stays.
-        for (int32_t n = 1; n <= b.itemNumbers[0]; ++n) XolReadDynamic(f, g.bed.data());
+        for (int32_t n = 1; n <= b.itemNumbers[0]; ++n) XolReadDynamic(f, item.data());
     } else {
         if (f.dataType != kHotStartDataType) StopRun("XOL data is not hot start data");
         // The scalars of the state file, then the bed over them.
-        XolReadDynamic(f, g.bed.data());
-        XolReadDynamic(f, g.bed.data());
+        XolReadDynamic(f, item.data());
+        XolReadDynamic(f, item.data());
     }
     XolClose(f);
+    std::copy(item.begin(), item.begin() + static_cast<ptrdiff_t>(g.Points()), g.bed.begin());
 }

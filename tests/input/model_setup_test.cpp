@@ -1,0 +1,142 @@
+// The model reader as a user meets it: the engine started on model files
+// with one thing wrong stops with that thing's message, and a sound file's
+// log records every setting, defaults marked.
+#include <gtest/gtest.h>
+
+#include "support/model_builder.hpp"
+#include "support/test_support.hpp"
+
+namespace {
+
+using Sections = std::map<std::string, std::string>;
+
+class ModelFile : public testing::Test {
+protected:
+    bwtest::TempDir dir;
+    bwtest::MapSpec spec;
+    void SetUp() override {
+        spec.J = 8, spec.K = 6;
+        // Water of 2 m inside a frame of land.
+        std::vector<float> bed = bwtest::Constant(spec, -2.0f);
+        for (int k = 0; k <= spec.K; ++k)
+            for (int j = 0; j <= spec.J; ++j)
+                if (j == 0 || j == spec.J || k == 0 || k == spec.K) bed[k * (spec.J + 1) + j] = 1.0f;
+        bwtest::WriteMapFile(dir / "bed.xol2", spec, bed);
+    }
+    // Runs the engine on the model; gives the exit code and what it printed.
+    bwtest::RunResult Run(const Sections& sections, const std::string& bathymetry = "bed.xol2") {
+        bwtest::WriteFile(dir / "m.bw", bwtest::ModelText(bathymetry, sections));
+        return bwtest::RunProgram({bwtest::BuiltProgram("bw"), "m.bw"}, dir.path.string(),
+                                  {{"TARN_PROGRESS", "NONE"}}, {"BUILDMODE", "TRF"});
+    }
+    // The map of one value on the model's grid, as a DATA_FILE section.
+    std::string Map(const std::string& name, float value) {
+        bwtest::WriteMapFile(dir / name, spec, bwtest::Constant(spec, value));
+        return bwtest::DataFileSection(name);
+    }
+    void ExpectStop(const Sections& sections, const std::string& message) {
+        const bwtest::RunResult r = Run(sections);
+        EXPECT_EQ(r.exitCode, 1) << message;
+        EXPECT_EQ(r.out, message + "\n");
+        EXPECT_NE(bwtest::ReadFile(dir / "m.log").find("Abnormal completion"), std::string::npos);
+    }
+};
+
+TEST_F(ModelFile, ASoundFileRunsAndItsLogHoldsEverySetting) {
+    const bwtest::RunResult r = Run({{"BASIC_MODEL_PARAMETERS", "OPEN_LOG_FILE_AFTER_RUN = 0\n"},
+                                     {"Simulation_Period", "Time_step_count = 3\n"
+                                                           "Time_step_interval = 0.1\n"}});
+    ASSERT_EQ(r.exitCode, 0) << r.out;
+    const std::string log = bwtest::ReadFile(dir / "m.log");
+    for (const char* line : {
+             "    NUMBER_OF_DIMENSIONS : 2 (default)\n",
+             "    True_land_value : 0\n",
+             "    Warm_up_period : 0 (default)\n",
+             "    Start_time : 0 0 0 0 0 0 (default)\n",
+             "    Deep_Water_Terms : False\n",
+             "    Time_extrapolation_factor_lower : 0 (default)\n",
+             "    Water_depth_limit : 0 (default)\n",
+             "    Sponge_Reference_s : 0 (default)\n",
+             "    supg_coefficient : 0.05 (default)\n",
+             "    Name_of_Text_Editor : Notepad.exe (default)\n",
+             "    minimum_depth : -0.02999",
+         })
+        EXPECT_NE(log.find(line), std::string::npos) << line;
+    // The sections in reading order.
+    size_t at = 0;
+    for (const char* section : {"BASIC_MODEL_PARAMETERS", "Bathymetry_Selection", "Area_Description",
+                                "Simulation_Period", "Equation_Parameters", "SOLUTION_PARAMETERS",
+                                "MOVING_SHORELINE", "Bottom_Friction", "WAVE_BREAKING",
+                                "EXPLICIT_FILTERING", "EDDY_VISCOSITY", "Porosity", "Sponge",
+                                "SURFACE_ELEVATION", "Boundary_Location", "Internal_Generation",
+                                "Output_Deterministic_2D", "OPTION_PARAMETERS"}) {
+        const size_t next = log.find(std::string("Section: ") + section + " ", at);
+        EXPECT_NE(next, std::string::npos) << section;
+        at = next == std::string::npos ? at : next;
+    }
+    // Keys behind a switched-off type are not read.
+    EXPECT_EQ(log.find("roller_factor"), std::string::npos);
+    EXPECT_EQ(log.find("smoothing_parameter"), std::string::npos);
+}
+
+TEST_F(ModelFile, AMissingSectionIsNamed) {
+    ExpectStop({{"Sponge", "-"}}, "KVT section: Sponge not found");
+    ExpectStop({{"Sponge", "Sponge_Type = true\n"}}, "KVT section: DATA_FILE not found");
+    ExpectStop({{"SURFACE_ELEVATION", "-"}}, "KVT section: SURFACE_ELEVATION not found");
+}
+
+TEST_F(ModelFile, SettingsOutOfRangeStopWithTheirRoutinesMessage) {
+    const struct {
+        Sections sections;
+        const char* message;
+    } cases[] = {
+        {{{"Equation_Parameters", "Deep_Water_Terms = true\nDispersion_Factor = 0.167\n"}},
+         "Dispersion factor out of valid range (-0.333 .. 0.166)"},
+        {{{"Porosity", "Porosity_Type = true\n" + Map("por.xol2", 0.1f)}},
+         "_SetupPorosity: porosity value outside interval 0.2<=n<=1"},
+        {{{"Sponge", "Sponge_Type = true\n" + Map("sponge.xol2", 0.5f)}},
+         "_SetupSpongeLayer: sponge coefficient outside interval 1<=s<=100"},
+        {{{"EXPLICIT_FILTERING", "type = 2\n" + Map("filter.xol2", 1.5f)}},
+         "_SetupExplicitFilter: filter coefficient outside interval 0<=f<=1"},
+        {{{"EXPLICIT_FILTERING", "type = 3\n"}}, "_SetupExplicitFilter: Wrong type of filter"},
+        {{{"Bottom_Friction", "Resistance_Type = 3\n"}},
+         "Bottom Friction: Wrong type of bottom friction formulation"},
+        {{{"EDDY_VISCOSITY", "Type = 3\nFormulation = 0\nBase = 1\n"}},
+         "_EddyViscocity: Wrong type of format"},
+        {{{"EDDY_VISCOSITY", "Type = 1\nFormulation = 2\nBase = 1\nConstant_Value = 1\n"}},
+         "_EddyViscocity: Wrong type of eddy formulation"},
+    };
+    for (const auto& c : cases) ExpectStop(c.sections, c.message);
+}
+
+TEST_F(ModelFile, MapValuesOnLandAreNotChecked) {
+    // The frame of land holds values no water point may have.
+    std::vector<float> por = bwtest::Constant(spec, 0.1f), sponge = bwtest::Constant(spec, 0.0f);
+    for (int k = 1; k < spec.K; ++k)
+        for (int j = 1; j < spec.J; ++j) {
+            por[k * (spec.J + 1) + j] = 0.6f;
+            sponge[k * (spec.J + 1) + j] = 1.0f;
+        }
+    bwtest::WriteMapFile(dir / "por.xol2", spec, por);
+    bwtest::WriteMapFile(dir / "sponge.xol2", spec, sponge);
+    const bwtest::RunResult r =
+        Run({{"Porosity", "Porosity_Type = true\n" + bwtest::DataFileSection("por.xol2")},
+             {"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("sponge.xol2")},
+             {"Simulation_Period", "Time_step_count = 2\nTime_step_interval = 0.1\n"}});
+    EXPECT_EQ(r.exitCode, 0) << r.out;
+}
+
+TEST_F(ModelFile, WhatThisVersionCannotRunStopsOnceAllIsRead) {
+    ExpectStop({{"WAVE_BREAKING", "type = 1\n"}},
+               "Wave breaking by surface rollers is not yet available in this version");
+    const std::string log = bwtest::ReadFile(dir / "m.log");
+    EXPECT_NE(log.find("    direction : 270 (default)\n"), std::string::npos);
+    EXPECT_NE(log.find("Section: OPTION_PARAMETERS"), std::string::npos);  // read to the end
+
+    ExpectStop({{"EDDY_VISCOSITY", "Type = 1\nFormulation = 1\nBase = 1\nConstant_Value = 0.2\n"}},
+               "Eddy viscosity of the Smagorinsky type is not yet available in this version");
+    ExpectStop({{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}},
+               "The 1DH mesh solver is not yet available in this version");
+}
+
+}  // namespace

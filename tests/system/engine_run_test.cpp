@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <regex>
 
+#include "support/model_builder.hpp"
 #include "support/test_support.hpp"
 
 namespace fs = std::filesystem;
@@ -14,13 +15,25 @@ using bwtest::RunResult;
 
 namespace {
 
-const char* kMinimalModel = R"(# The smallest model file the engine accepts.
-TARNEL_BOUSSINESQ_WAVE {
-    BASIC_MODEL_PARAMETERS {
-        OPEN_LOG_FILE_AFTER_RUN = 0
-    }
+// A small complete model: a basin of 2 m water in a frame of land, still
+// at the start, run for two steps without processes or outputs.
+void WriteSmallModel(const bwtest::TempDir& dir, const std::string& name) {
+    bwtest::MapSpec spec;
+    spec.J = 8, spec.K = 6;
+    std::vector<float> bed = bwtest::Constant(spec, -2.0f);
+    for (int k = 0; k <= spec.K; ++k)
+        for (int j = 0; j <= spec.J; ++j)
+            if (j == 0 || j == spec.J || k == 0 || k == spec.K) bed[k * (spec.J + 1) + j] = 1.0f;
+    bwtest::WriteMapFile(dir / "bed.xol2", spec, bed);
+    bwtest::WriteFile(
+        dir / name,
+        "# A basin at rest.\n" +
+            bwtest::ModelText("bed.xol2",
+                              {{"BASIC_MODEL_PARAMETERS", "OPEN_LOG_FILE_AFTER_RUN = 0\n"},
+                               {"Simulation_Period",
+                                "Time_step_count = 2\nTime_step_interval = 0.1\n"
+                                "Start_time = 2004, 1, 1, 0, 0, 0\n"}}));
 }
-)";
 
 class EngineRun : public testing::Test {
 protected:
@@ -72,7 +85,7 @@ TEST_F(EngineRun, ASyntaxErrorGivesItsLineAndColumn) {
 }
 
 TEST_F(EngineRun, AMinimalModelRunsToSuccessfulCompletion) {
-    bwtest::WriteFile(dir / "harbour.bw", kMinimalModel);
+    WriteSmallModel(dir, "harbour.bw");
     bwtest::WriteFile(dir / "harbour._kill_", "left over from an earlier run");
     RunResult r = Run({"harbour.bw"});
     EXPECT_EQ(r.exitCode, 0) << r.out << r.err;
@@ -101,7 +114,8 @@ TEST_F(EngineRun, AMinimalModelRunsToSuccessfulCompletion) {
     EXPECT_LT(log.find("Overall Timings"), log.find("Performance"));
     EXPECT_EQ(LastLine(dir / "harbour.log"), "Successful completion");
 
-    EXPECT_EQ(bwtest::ReadFile(dir / "harbour._spi_"), "PROGRE          0\n");
+    // The channel starts at nothing done; the time loop reports behind it.
+    EXPECT_EQ(bwtest::ReadFile(dir / "harbour._spi_").rfind("PROGRE          0\n", 0), 0u);
     EXPECT_FALSE(fs::exists(dir / "harbour._kill_"));
 }
 
@@ -119,7 +133,7 @@ TEST_F(EngineRun, MissingTargetOrSectionStopsTheRun) {
 }
 
 TEST_F(EngineRun, UnderALauncherEachProcessWritesItsOwnFiles) {
-    bwtest::WriteFile(dir / "basin.bw", kMinimalModel);
+    WriteSmallModel(dir, "basin.bw");
     const std::string mpirun = "/usr/bin/mpirun";
     ASSERT_TRUE(fs::exists(mpirun));
     RunResult r =

@@ -51,12 +51,9 @@ TEST_F(ModelFile, ASoundFileRunsAndItsLogHoldsEverySetting) {
     for (const char* line : {
              "    NUMBER_OF_DIMENSIONS : 2 (default)\n",
              "    True_land_value : 0\n",
-             "    Warm_up_period : 0 (default)\n",
              "    Start_time : 0 0 0 0 0 0 (default)\n",
              "    Deep_Water_Terms : False\n",
              "    Time_extrapolation_factor_lower : 0 (default)\n",
-             "    Water_depth_limit : 0 (default)\n",
-             "    Sponge_Reference_s : 0 (default)\n",
              "    supg_coefficient : 0.05 (default)\n",
              "    Name_of_Text_Editor : Notepad.exe (default)\n",
              "    minimum_depth : -0.02999",

@@ -13,7 +13,6 @@
 #include "processes/porosity.hpp"
 #include "processes/rollers.hpp"
 #include "processes/shoreline.hpp"
-#include "processes/sponge.hpp"
 #include "run/progress.hpp"
 #include "run/units.hpp"
 #include "solver2d/model_state.hpp"
@@ -153,7 +152,6 @@ TEST_F(ModelReader, ProcessSettings) {
     bwtest::WriteMapFile(dir / "por.xol2", spec, bwtest::Constant(spec, 0.5f));
     Read({{"MOVING_SHORELINE", "type = 1\ndepth = -4\nwidth = 0.02\n"},
           {"Bottom_Friction", "Resistance_Type = 1\nFormulation = 1\nConstant_Value = 40\n"},
-          {"EXPLICIT_FILTERING", "type = 1\n"},
           {"EDDY_VISCOSITY", "Type = 1\nFormulation = 0\nBase = 0\nConstant_Value = 0.3\n"},
           {"Porosity", "Porosity_Type = true\nParticle_Diameter = 0.1\n" +
                            bwtest::DataFileSection("por.xol2")},
@@ -161,20 +159,14 @@ TEST_F(ModelReader, ProcessSettings) {
     EXPECT_EQ(gShoreline.type, 1);
     EXPECT_EQ(gShoreline.slotDepth, -4.0);
     EXPECT_EQ(gShoreline.width, 0.02);
-    EXPECT_EQ(gShoreline.lambda, 100.0);
     EXPECT_EQ(gFriction.frictionConstant, 9.81f / 1600.0f);
-    EXPECT_EQ(gFilter.filterCoef, std::vector<float>(gGrid.Points(), 0.2f));
     // Base 0: the field is there and the sweeps act as if it were off.
     EXPECT_EQ(gEddy.eddyType, -1);
     EXPECT_EQ(gEddy.eddyViscosity, std::vector<float>(gGrid.Points(), 0.3f));
     EXPECT_FLOAT_EQ(gPorosity.alpha, 1.4e-06f * 1000.0f / 0.01f);
-    EXPECT_FLOAT_EQ(gPorosity.beta, 28.0f);
     EXPECT_EQ(At(gPorosity.porosity, 3, 1), 0.5f);
-    EXPECT_EQ(gSponge.sponge, std::vector<float>(gGrid.Points(), 1.0f));
     EXPECT_EQ(gOptions.spongeReferenceS, 1.5f);
-    EXPECT_EQ(gOptions.spongeReferenceP, 0.0f);
     EXPECT_EQ(gProgress.updateInterval, 7);
-    EXPECT_EQ(gOptions.nameOfTextEditor, "Notepad.exe");
     // The slot reaches the initial depth: above the bed it adds its cross-section.
     const double hs = -1.2 + 4.0;
     const double slot = hs * ((1 - std::exp(-100.0)) * 0.98 / 100.0 + 0.02);

@@ -81,13 +81,4 @@ TEST_F(SlotDepth, LandAndBedsBelowTheSlotKeepThePlainDepth) {
     EXPECT_EQ(depth[2], 0.7f);
 }
 
-TEST_F(SlotDepth, OffTheStorageWidthIsOne) {
-    gShoreline.type = 0;
-    gGrid.J = 0;
-    gGrid.bed.assign(1, -1.0f);
-    EXPECT_EQ(StorageWidthAt(0, 0, -5.0f), 1.0f);
-    gShoreline.type = 1;
-    EXPECT_LT(StorageWidthAt(0, 0, -5.0f), 0.02f);
-}
-
 }  // namespace

@@ -205,15 +205,19 @@ int32_t NumberSources() {
 // the same numbering since the records are the same.
 void ReadHotStartSources() {
     GenerationState& s = gGeneration;
-    GridState& g = gGrid;
+    std::vector<float> work;
+    try {
+        work.assign(std::max(gGrid.Points(), static_cast<size_t>(s.sourceCount)), 0.0f);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
     XolFile f = XolOpenRead(gBathymetry.fileName);
     std::vector<float>* targets[4] = {&s.sourceP, &s.sourceQ, &s.sourcePPrev, &s.sourceQPrev};
-    const size_t count = std::min(static_cast<size_t>(s.sourceCount), g.work.size());
     for (int32_t item = 1; item <= kHotStartItems; ++item) {
-        XolReadDynamic(f, g.work.data());
+        XolReadDynamic(f, work.data());
         if (item < 15) continue;
         std::vector<float>& v = *targets[item - 15];
-        std::copy(g.work.begin(), g.work.begin() + static_cast<ptrdiff_t>(count), v.begin() + 1);
+        std::copy(work.begin(), work.begin() + s.sourceCount, v.begin() + 1);
     }
     XolClose(f);
 }

@@ -136,6 +136,35 @@ TEST_F(Generation, ALineFileStartsWithTheRecordsAroundTheSimulationStart) {
     EXPECT_EQ(gGeneration.sourceXiY.size(), 9u);
 }
 
+TEST_F(Generation, AHotStartBringsBackTheSourcesOfItsItems15To18) {
+    // A state file whose item n holds 1000 n + i at its i-th value.
+    XolFile f = XolCreateHeader("State", 18, 2);
+    for (int n = 1; n <= 18; ++n) XolSetItem(f, n, 999, "Item " + std::to_string(n), 0);
+    XolSetAxis(f, 1, 1.0f, 0.0f, 31);
+    XolSetAxis(f, 2, 1.0f, 0.0f, 26);
+    XolSetCalendarAxis(f, 1.0, "2004-01-01 00:00:00");
+    XolSetDataType(f, 11);
+    XolCreateFile(f, dir / "state.xol2");
+    std::vector<float> v(31 * 26);
+    for (int n = 1; n <= 18; ++n) {
+        for (size_t i = 0; i < v.size(); ++i) v[i] = 1000.0f * n + i;
+        XolWriteDynamic(f, v.data());
+    }
+    XolClose(f);
+    gBathymetry.hotStart = true;
+    gBathymetry.fileName = dir / "state.xol2";
+    Setup({{10, 5, 10, 20, 16}});
+    gBathymetry = BathymetrySettings{};
+    const GenerationState& s = gGeneration;
+    for (int i : {1, 32}) {
+        EXPECT_EQ(s.sourceP[i], 15000.0f + i - 1);
+        EXPECT_EQ(s.sourceQ[i], 16000.0f + i - 1);
+        EXPECT_EQ(s.sourcePPrev[i], 17000.0f + i - 1);
+        EXPECT_EQ(s.sourceQPrev[i], 18000.0f + i - 1);
+        EXPECT_EQ(s.sourcePPrev2[i], 0.0f);
+    }
+}
+
 TEST_F(Generation, WrongLineFilesStopTheRun) {
     setenv("TRF", "HUD", 1);
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 5}}), testing::ExitedWithCode(1),

@@ -67,8 +67,7 @@ void ReadBathymetry(KvtHandle target) {
     if (twoD) {
         g.projection = std::string(TrimRight(f.projection));
         g.orientation = static_cast<float>(f.orientation);
-        if (Trim(g.projection).empty())
-            StopRun("XOL data does not contain projection information");
+        if (Trim(g.projection).empty()) StopRun("XOL data does not contain projection information");
     }
     int32_t count = 0;
     XolGetAxis(f, 1, g.dx, count);

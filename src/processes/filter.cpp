@@ -65,9 +65,12 @@ void FilterRound(Field& field, int axis, bool shortEnd) {
     GridState& g = gGrid;
     const ChainTables& c = gChains;
     const ptrdiff_t stride = static_cast<ptrdiff_t>(g.Stride());
-    FilterLine l{field.data(), g.filterBuffer.data(), gFilter.filterCoef.data(),
+    FilterLine l{field.data(),
+                 g.filterBuffer.data(),
+                 gFilter.filterCoef.data(),
                  axis == 1 ? c.codeX.data() : c.codeY.data(),
-                 axis == 1 ? 1 : stride, axis == 1 ? stride : 1,
+                 axis == 1 ? 1 : stride,
+                 axis == 1 ? stride : 1,
                  gGeneration.numberOfRecords > 0};
     const int32_t lines = axis == 1 ? g.K + 1 : g.J + 1;
 #pragma omp parallel for schedule(static)

@@ -35,7 +35,9 @@ void KeepDataFile(const DataFileRef& ref, std::string& fileName, int32_t& itemCo
     for (size_t i = 0; i < N; ++i) itemNumbers[i] = ref.itemNumbers[i];
 }
 
-GridShape ModelGrid() { return GridShape{gGrid.dx, gGrid.dy, gGrid.J, gGrid.K}; }
+GridShape ModelGrid() {
+    return GridShape{gGrid.dx, gGrid.dy, gGrid.J, gGrid.K};
+}
 
 }  // namespace
 

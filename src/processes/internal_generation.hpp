@@ -43,7 +43,7 @@ struct GenerationState {
     std::vector<float> sourceQ, sourceQPrev, sourceQPrev2;
     std::vector<float> sourceXiX, sourceXiY;  // with Deep_Water_Terms only
     int32_t genJ1 = 0, genJ2 = 0, genK1 = 0, genK2 = 0;
-    std::vector<InternalLineFile> lineFiles;  // record r at index r - 1; open for waveType != 0
+    std::vector<InternalLineFile> lineFiles;    // record r at index r - 1; open for waveType != 0
     std::vector<float> lineValues, deepValues;  // max(J, K) + 1 values along a line
 };
 extern GenerationState gGeneration;

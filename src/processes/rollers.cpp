@@ -48,8 +48,8 @@ void SetupWaveBreaking(KvtHandle target) {
     const GridState& g = gGrid;
     const size_t n = g.Points();
     try {
-        for (std::vector<float>* f : {&r.tanPhi, &r.tanPhiOld, &r.delta, &r.deltaOld, &r.cx,
-                                      &r.cxOld, &r.cy, &r.cyOld})
+        for (std::vector<float>* f :
+             {&r.tanPhi, &r.tanPhiOld, &r.delta, &r.deltaOld, &r.cx, &r.cxOld, &r.cy, &r.cyOld})
             f->assign(n, 0.0f);
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");

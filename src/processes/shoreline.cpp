@@ -46,8 +46,7 @@ float StorageWidthAt(int32_t j, int32_t k, float surface) {
     if (gShoreline.type <= 0) return 1.0f;
     const ShorelineSettings& s = gShoreline;
     const double d = -static_cast<double>(gGrid.bed[gGrid.At(j, k)]);
-    return static_cast<float>(
-        StorageWidth(surface, d, s.slotDepth, s.maxDepth, s.width, s.lambda));
+    return static_cast<float>(StorageWidth(surface, d, s.slotDepth, s.maxDepth, s.width, s.lambda));
 }
 
 void SlotCorrection(float* target, const float* bed) {

@@ -20,7 +20,8 @@ protected:
         std::vector<float> bed = bwtest::Constant(spec, -2.0f);
         for (int k = 0; k <= spec.K; ++k)
             for (int j = 0; j <= spec.J; ++j)
-                if (j == 0 || j == spec.J || k == 0 || k == spec.K) bed[k * (spec.J + 1) + j] = 1.0f;
+                if (j == 0 || j == spec.J || k == 0 || k == spec.K)
+                    bed[k * (spec.J + 1) + j] = 1.0f;
         bwtest::WriteMapFile(dir / "bed.xol2", spec, bed);
     }
     // Runs the engine on the model; gives the exit code and what it printed.
@@ -44,8 +45,9 @@ protected:
 
 TEST_F(ModelFile, ASoundFileRunsAndItsLogHoldsEverySetting) {
     const bwtest::RunResult r = Run({{"BASIC_MODEL_PARAMETERS", "OPEN_LOG_FILE_AFTER_RUN = 0\n"},
-                                     {"Simulation_Period", "Time_step_count = 3\n"
-                                                           "Time_step_interval = 0.1\n"}});
+                                     {"Simulation_Period",
+                                      "Time_step_count = 3\n"
+                                      "Time_step_interval = 0.1\n"}});
     ASSERT_EQ(r.exitCode, 0) << r.out;
     const std::string log = bwtest::ReadFile(dir / "m.log");
     for (const char* line : {
@@ -61,12 +63,12 @@ TEST_F(ModelFile, ASoundFileRunsAndItsLogHoldsEverySetting) {
         EXPECT_NE(log.find(line), std::string::npos) << line;
     // The sections in reading order.
     size_t at = 0;
-    for (const char* section : {"BASIC_MODEL_PARAMETERS", "Bathymetry_Selection", "Area_Description",
-                                "Simulation_Period", "Equation_Parameters", "SOLUTION_PARAMETERS",
-                                "MOVING_SHORELINE", "Bottom_Friction", "WAVE_BREAKING",
-                                "EXPLICIT_FILTERING", "EDDY_VISCOSITY", "Porosity", "Sponge",
-                                "SURFACE_ELEVATION", "Boundary_Location", "Internal_Generation",
-                                "Output_Deterministic_2D", "OPTION_PARAMETERS"}) {
+    for (const char* section :
+         {"BASIC_MODEL_PARAMETERS", "Bathymetry_Selection", "Area_Description", "Simulation_Period",
+          "Equation_Parameters", "SOLUTION_PARAMETERS", "MOVING_SHORELINE", "Bottom_Friction",
+          "WAVE_BREAKING", "EXPLICIT_FILTERING", "EDDY_VISCOSITY", "Porosity", "Sponge",
+          "SURFACE_ELEVATION", "Boundary_Location", "Internal_Generation",
+          "Output_Deterministic_2D", "OPTION_PARAMETERS"}) {
         const size_t next = log.find(std::string("Section: ") + section + " ", at);
         EXPECT_NE(next, std::string::npos) << section;
         at = next == std::string::npos ? at : next;

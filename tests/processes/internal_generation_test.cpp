@@ -1,5 +1,7 @@
 // The setup of internal generation: the points of a line, their numbers in
 // the source map, and the line files that feed them.
+#include "processes/internal_generation.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cstdlib>
@@ -7,7 +9,6 @@
 
 #include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
-#include "processes/internal_generation.hpp"
 #include "solver2d/model_state.hpp"
 #include "support/log_capture.hpp"
 #include "support/model_builder.hpp"

@@ -88,8 +88,9 @@ protected:
 
 TEST_F(ModelReader, GridPeriodAndTheReferenceLevelShift) {
     Read({{"Area_Description", "True_land_value = 0.5\nReference_Level_Shift = 1\n"},
-          {"Simulation_Period", "Time_step_count = 20\nTime_step_interval = 0.25\n"
-                                "Warm_up_period = 4\nStart_time = 2004, 2, 29, 23, 59, 30\n"}});
+          {"Simulation_Period",
+           "Time_step_count = 20\nTime_step_interval = 0.25\n"
+           "Warm_up_period = 4\nStart_time = 2004, 2, 29, 23, 59, 30\n"}});
     const GridState& g = gGrid;
     EXPECT_EQ(g.J, 6);
     EXPECT_EQ(g.K, 4);
@@ -116,8 +117,9 @@ TEST_F(ModelReader, GridPeriodAndTheReferenceLevelShift) {
 
 TEST_F(ModelReader, TheSelectedItemOfTheBathymetryStays) {
     WriteItems(dir / "three.xol2", spec, 4, -10.0f);
-    Read({{"Bathymetry_Selection",
-           "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"}});
+    Read(
+        {{"Bathymetry_Selection",
+          "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"}});
     EXPECT_EQ(At(gGrid.bed, 5, 2), -7.0f);
     EXPECT_FALSE(gBathymetry.hotStart);
     EXPECT_EQ(gBathymetry.itemNumbers[0], 3);
@@ -153,8 +155,8 @@ TEST_F(ModelReader, ProcessSettings) {
     Read({{"MOVING_SHORELINE", "type = 1\ndepth = -4\nwidth = 0.02\n"},
           {"Bottom_Friction", "Resistance_Type = 1\nFormulation = 1\nConstant_Value = 40\n"},
           {"EDDY_VISCOSITY", "Type = 1\nFormulation = 0\nBase = 0\nConstant_Value = 0.3\n"},
-          {"Porosity", "Porosity_Type = true\nParticle_Diameter = 0.1\n" +
-                           bwtest::DataFileSection("por.xol2")},
+          {"Porosity",
+           "Porosity_Type = true\nParticle_Diameter = 0.1\n" + bwtest::DataFileSection("por.xol2")},
           {"OPTION_PARAMETERS", "Sponge_Reference_s = 1.5\nHUD_update_2DH = 7\n"}});
     EXPECT_EQ(gShoreline.type, 1);
     EXPECT_EQ(gShoreline.slotDepth, -4.0);

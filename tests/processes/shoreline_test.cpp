@@ -1,10 +1,11 @@
 // The slot of the moving shoreline: its storage width and the effective depth
 // over slot and bed, against the closed forms of the integral of the width.
+#include "processes/shoreline.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cmath>
 
-#include "processes/shoreline.hpp"
 #include "solver2d/model_state.hpp"
 
 namespace {

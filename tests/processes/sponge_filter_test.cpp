@@ -79,7 +79,8 @@ protected:
     }
     double RowAmplitude(const Field& field, int32_t from, int32_t to) {
         double a = 0.0;
-        for (int32_t j = from; j <= to; ++j) a = std::max(a, static_cast<double>(std::fabs(field[gGrid.At(j, 3)])));
+        for (int32_t j = from; j <= to; ++j)
+            a = std::max(a, static_cast<double>(std::fabs(field[gGrid.At(j, 3)])));
         return a;
     }
 };

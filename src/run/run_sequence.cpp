@@ -14,7 +14,6 @@
 #include "run/units.hpp"
 #include "solver2d/time_loop.hpp"
 
-RunState gRun;
 
 namespace {
 

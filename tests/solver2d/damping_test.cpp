@@ -152,8 +152,10 @@ TEST(Damping, TheFilterRemovesAGridScaleZigzagAndKeepsASmoothWave) {
     const double smooth0 = bwtest::Project(smooth), zig0 = bwtest::Project(zigzag);
     bwtest::RunSteps(5);
     const double smooth1 = bwtest::Project(smooth), zig1 = bwtest::Project(zigzag);
-    EXPECT_LT(std::fabs(zig1), 0.05 * std::fabs(zig0));
-    // The smooth wave moves on (a tenth of its period) but keeps its size.
+    // Each pass keeps 0.8 of a checkerboard: ten passes (two a step) leave
+    // about a tenth of it.
+    EXPECT_LT(std::fabs(zig1), 0.12 * std::fabs(zig0));
+    // The smooth wave moves on (a seventieth of its period) but keeps its size.
     EXPECT_NEAR(smooth1 / smooth0, 1.0, 0.02);
 }
 

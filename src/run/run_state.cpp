@@ -1,0 +1,3 @@
+#include "run/run_state.hpp"
+
+RunState gRun;

@@ -5,7 +5,7 @@ set -euo pipefail
 here=$(cd "$(dirname "$0")" && pwd)
 root=$(cd "$here/../.." && pwd)
 bin=${1:-$root/build/release}
-bw=$bin/bw
+bw=$bin/src/bw
 bwdata=$bin/tools/bwdata/bwdata
 bwplot=$root/tools/bwplot/bwplot
 cd "$here"

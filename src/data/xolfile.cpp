@@ -388,14 +388,17 @@ void XolSetItem(XolFile& f, int32_t n, int32_t type, const std::string& name, in
     Succeed(status);
 }
 
-void XolSetCalendarAxis(XolFile& f, double step, const std::string& start, int32_t timeUnit) {
+void XolSetCalendarAxis(XolFile& f, double step, const std::string& start, int32_t timeUnit,
+                        double startOffset) {
     const std::string text = start + std::string(19, ' ');
     f.timeAxisType = kXolTimeCalendar;
     f.startDateTime = Cut(start, 32);
+    f.startOffset = startOffset;
     f.timeStep = step;
     f.timeUnit = timeUnit;
     f.timeUnitText = UnitText(timeUnit);
-    xolSetEqCalendarAxis(f.header, text.substr(0, 10), text.substr(11, 8), timeUnit, 0.0, step, 0);
+    xolSetEqCalendarAxis(f.header, text.substr(0, 10), text.substr(11, 8), timeUnit, startOffset,
+                         step, 0);
 }
 
 void XolSetAxis(XolFile& f, int axis, float spacing, float origin, int32_t count, int32_t unit) {

@@ -118,9 +118,10 @@ XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimensi
                         const XolHeaderOptions& options = {}, int* status = nullptr);
 void XolSetItem(XolFile& file, int32_t item, int32_t type, const std::string& name, int32_t unit,
                 int* status = nullptr);
-// start: "YYYY-MM-DD hh:mm:ss".
+// start: "YYYY-MM-DD hh:mm:ss"; startOffset: seconds from it to the first
+// record (a start between whole seconds).
 void XolSetCalendarAxis(XolFile& file, double step, const std::string& start,
-                        int32_t timeUnit = 1400);
+                        int32_t timeUnit = 1400, double startOffset = 0.0);
 void XolSetAxis(XolFile& file, int axis, float spacing, float origin, int32_t count,
                 int32_t unit = 1000);
 void XolSetProjection(XolFile& file, const std::string& projection, double longitude,

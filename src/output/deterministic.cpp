@@ -230,8 +230,10 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
             XolSetItem(r.file, n++, info.type, name, info.unit);
         }
     }
+    // The text holds whole seconds; a start between them goes into the offset.
     const DateTime start = AddSeconds(g.start, startStep * g.dt);
-    XolSetCalendarAxis(r.file, stepInterval * g.dt, DateTimeText(start));
+    const double fraction = start.seconds - std::floor(start.seconds);
+    XolSetCalendarAxis(r.file, stepInterval * g.dt, DateTimeText(start), 1400, fraction);
     XolSetMisc(r.file, 4, g.landValue);
     if (r.dimension == 2) {
         const double x = s.j0 * static_cast<double>(g.dx), y = s.k0 * static_cast<double>(g.dy);
@@ -239,6 +241,7 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
         std::string projection;
         GeoFrameXy2Geo(g.frame, x, y, lon, lat);
         GeoFrameGetTrueNorth(g.frame, x, y, north);
+        north += 0.0;  // no negative zero in the file
         GeoFrameGetProjectionString(g.frame, projection);
         XolSetProjection(r.file, projection, lon, lat, north);
     } else {

@@ -136,6 +136,18 @@ TEST_F(ModelFile, WhatThisVersionCannotRunStopsOnceAllIsRead) {
                "Eddy viscosity of the Smagorinsky type is not yet available in this version");
     ExpectStop({{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}},
                "The 1DH mesh solver is not yet available in this version");
+
+    // A generation line of three points fed by a series of one item.
+    bwtest::WriteSeriesFile(dir / "gen.xol0", "2004-01-01 00:00:00", 0.5,
+                            {std::vector<float>(5, 0.0f)});
+    const std::string generation =
+        "Number_Of_Records = 1\nINTERNAL_GEN_DATA_1 {\nFirst_Line_Pos = 2, 2\n"
+        "Last_Line_Pos = 2, 4\nWave_Type = 0\n" + bwtest::DataFileSection("gen.xol0") + "}\n";
+    ExpectStop({{"Internal_Generation", generation}},
+               "Internal wave generation is not yet available in this version");
+    ExpectStop({{"Internal_Generation", generation},
+                {"Equation_Parameters", "Deep_Water_Terms = true\nDispersion_Factor = 0.0667\n"}},
+               "SetupInternalGeneration: the deep water terms need two items in the series");
 }
 
 }  // namespace

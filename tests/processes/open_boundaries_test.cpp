@@ -211,6 +211,15 @@ TEST_F(BoundariesDeathTest, SeriesFilesThatDoNotFitStop) {
     bwtest::WriteLineFile(dir / "line.xol1", kStart, 0.5, 2.0f, {{{1, 1}, {1, 1}, {1, 1}, {1, 1}, {1, 1}}});
     EXPECT_EXIT(ReadTimeSeries0D(dir / "line.xol1", 1, items, methods, s), testing::ExitedWithCode(1),
                 "XOL data is not 0D");
+    // A series on a relative time axis has no date to meet the run's start.
+    XolFile relative = XolCreateHeader("Relative", 1, 0);
+    XolSetItem(relative, 1, 100078, "Level", 1000);
+    xolSetEqTimeAxis(relative.header, 1400, 0.0, 0.5, 0);
+    XolCreateFile(relative, dir / "relative.xol0");
+    for (float v : {0.0f, 1.0f, 2.0f, 3.0f, 4.0f, 5.0f}) XolWriteDynamic(relative, &v);
+    XolClose(relative);
+    EXPECT_EXIT(ReadTimeSeries0D(dir / "relative.xol0", 1, items, methods, s), testing::ExitedWithCode(1),
+                "XOL data does not contain a calendar time axis");
     // With the deep water terms a boundary series needs its second item.
     gEquation.deepWaterTerms = true;
     EXPECT_EXIT(Setup({{0, 1, 0, 5}}), testing::ExitedWithCode(1),

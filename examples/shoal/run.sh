@@ -43,6 +43,6 @@ cat <<TEXT
 Look further:
   $bwdata info surface.xol2          what a result file holds
   ncdump -h surface.xol2             the NetCDF header (items, units, time axis)
-  /usr/bin/python3 -c "import xarray; print(xarray.open_dataset('gauges.xol0'))"
+  /usr/bin/python3 -c "import netCDF4; print(netCDF4.Dataset('gauges.xol0'))"   (or xarray.open_dataset)
   $bwplot surface.xol2 --step 40 --out map.png
 TEXT

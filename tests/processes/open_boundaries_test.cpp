@@ -127,6 +127,8 @@ TEST_F(BoundariesDeathTest, SkewLinesAndUnknownSettingsStop) {
     EXPECT_EXIT(Setup({{4, 1, 4, 5}}), testing::ExitedWithCode(1), "Boundary line is skew to the grid");
     // A single inner point with two land neighbours.
     EXPECT_EXIT(Setup({{1, 1, 1, 1}}), testing::ExitedWithCode(1), "Boundary line is skew to the grid");
+    EXPECT_EXIT(Setup({{0, 1, 0, 9}}), testing::ExitedWithCode(1),
+                "SetupOpenBoundaries: boundary 1 has a point outside the grid \\(0..8,0..6\\)");
     Line flux{0, 1, 0, 5};
     flux.formulation = 2;
     EXPECT_EXIT(Setup({flux}), testing::ExitedWithCode(1), "Boundary formulation is unknown");

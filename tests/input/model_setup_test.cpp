@@ -136,6 +136,8 @@ TEST_F(ModelFile, WhatThisVersionCannotRunStopsOnceAllIsRead) {
                "Eddy viscosity of the Smagorinsky type is not yet available in this version");
     ExpectStop({{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}},
                "The 1DH mesh solver is not yet available in this version");
+    ExpectStop({{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 3\n"}},
+               "ReadModelSetup: NUMBER_OF_DIMENSIONS must be 1 or 2, not 3");
 
     // A generation line of three points fed by a series of one item.
     bwtest::WriteSeriesFile(dir / "gen.xol0", "2004-01-01 00:00:00", 0.5,

@@ -213,6 +213,25 @@ TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
                  "Number_Of_Records = 1\n" + Spec(1, "out.xol1", "0, 11, 1", "4, 4, 1", "1", 1, 5, 1)}},
                "SetupOutputDeterministic2D: X_Range_And_Interval of record 1 must run from first to "
                "last within 0..10 with an interval of at least 1");
+    // A point file names its points one by one; a record needs a step, an item and a point.
+    auto points = [](const std::string& count, const std::string& x, const std::string& interval,
+                     const std::string& items) {
+        return "Number_Of_Records = 1\nOutput_Spec_Data_1 {\nFile_Name = file(\"p.xol0\")\n"
+               "NO_OF_POINTS = " + count + "\nX_Range_And_Interval = " + x +
+               "\nY_Range_And_Interval = 2, 3\nFirst_Time_step = 0\nLast_Time_step = 5\n"
+               "Time_Step_Interval = " + interval + "\nNumber_Of_Items = " + items +
+               "\nItem_Numbers = 1\nTitle = \"P\"\n}\n";
+    };
+    ExpectStop({{"Output_Deterministic_2D", points("2", "1, 11", "1", "1")}},
+               "SetupOutputDeterministic2D: point 2 of record 1 lies outside the grid");
+    ExpectStop({{"Output_Deterministic_2D", points("0", "1", "1", "1")}},
+               "SetupOutputDeterministic2D: NO_OF_POINTS of record 1 must be at least 1");
+    ExpectStop({{"Output_Deterministic_2D", points("2", "1, 2", "0", "1")}},
+               "SetupOutputDeterministic2D: Time_Step_Interval of record 1 must be at least 1");
+    ExpectStop({{"Output_Deterministic_2D", points("2", "1, 2", "1", "0")}},
+               "SetupOutputDeterministic2D: Number_Of_Items of record 1 must be at least 1");
+    ExpectStop({{"Output_Statistic_2D", "Type = 1\nTime_Step_Interval = 0\nNumber_Of_Records = 0\n"}},
+               "Output_Statistic_2D: Time_Step_Interval must be at least 1");
     ExpectStop({{"Output_Statistic_2D", "Type = 1\nTime_Step_Interval = 10\nNumber_Of_Records = 0\n"}},
                "Wave statistics output is not yet available in this version");
     ExpectStop({{"Output_Disturbance_2D", "Type = 1\nTime_Step_Interval = 10\n"}},

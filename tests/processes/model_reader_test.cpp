@@ -216,6 +216,10 @@ TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
     bwtest::WriteMapFile(dir / "bare.xol2", bare, Bed());
     EXPECT_EXIT(Read({}, "bare.xol2"), testing::ExitedWithCode(1),
                 "XOL data does not contain projection information");
+    bare.projection = "NO-SUCH-FRAME";
+    bwtest::WriteMapFile(dir / "bogus.xol2", bare, Bed());
+    EXPECT_EXIT(Read({}, "bogus.xol2"), testing::ExitedWithCode(1),
+                "Unable to initialize the cartography module");
     bwtest::MapSpec wide = spec;
     wide.J = 7;
     bwtest::WriteMapFile(dir / "wide.xol2", wide, bwtest::Constant(wide, 1.0f));

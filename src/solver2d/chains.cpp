@@ -79,6 +79,34 @@ void WriteChains(const std::vector<int32_t>& counts, const std::vector<ChainPair
     }
 }
 
+// The points of the surface estimate along one axis's chains: the inner
+// points of a chain, with its ends where the code across lets the flux in
+// (2 at the first, 3 at the last), all of a chain of one point; none of a
+// chain whose end lies on a level or flux boundary of the other axis.
+void MarkSurfacePoints(bool columns, std::vector<uint8_t>& mark) {
+    const GridState& g = gGrid;
+    const ChainTables& t = gChains;
+    const std::vector<int32_t>& codeAlong = columns ? t.codeX : t.codeY;
+    const std::vector<int32_t>& codeEnds = columns ? t.codeY : t.codeX;
+    mark.assign(g.Points(), 0);
+    const int32_t lines = columns ? g.J : g.K;
+    for (int32_t l = 0; l <= lines; ++l) {
+        const int32_t count = columns ? t.chainCountY[l] : t.chainCountX[l];
+        auto at = [&](int32_t i) { return columns ? g.At(l, i) : g.At(i, l); };
+        for (int32_t c = 1; c <= count; ++c) {
+            const ChainPair& ch = columns ? t.Y(l, c) : t.X(l, c);
+            if (codeEnds[columns ? at(ch.first) : at(ch.last)] >= kCodeLevelBoundary) continue;
+            if (ch.first == ch.last) {
+                mark[at(ch.first)] = 2;
+                continue;
+            }
+            const int32_t from = codeAlong[at(ch.first)] == 2 ? ch.first : ch.first + 1;
+            const int32_t to = codeAlong[at(ch.last)] == 3 ? ch.last : ch.last - 1;
+            for (int32_t i = from; i <= to; ++i) mark[at(i)] = 1;
+        }
+    }
+}
+
 }  // namespace
 
 void MakeChains() {
@@ -154,6 +182,12 @@ void MakeChains() {
     }
 
     MarkBoundaries();
+    try {
+        MarkSurfacePoints(true, t.surfaceX);
+        MarkSurfacePoints(false, t.surfaceY);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
 }
 
 void CountWaterPoints(int32_t& count) {

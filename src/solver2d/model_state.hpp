@@ -88,6 +88,10 @@ struct ChainTables {
     std::vector<ChainPair> chainX, chainY;   // row k: chainX[k*maxX + n-1], n = 1..count
     int32_t maxChainsX = 0, maxChainsY = 0;  // J/2+1 and K/2+1
     int32_t activePoints = 0;                // CountWaterPoints
+    // The points whose surface estimate each half step computes (surfaceX
+    // before the x-sweep, from the y chains; surfaceY from the x chains):
+    // 1 a point of a chain, 2 the point of a chain of one point, 0 none.
+    std::vector<uint8_t> surfaceX, surfaceY;
     const ChainPair& X(int32_t k, int32_t n) const {
         return chainX[static_cast<size_t>(k) * maxChainsX + (n - 1)];
     }

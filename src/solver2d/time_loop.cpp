@@ -96,62 +96,69 @@ namespace {
 // The surface at the next half level from the continuity equation over one
 // whole step, each flux taken at the time level the weights give: wA on the
 // newer and 1 - wA on the older flux along the chains, wC and 1 - wC across.
-// axis 1: columns and their y chains (xiExtX); axis 2: rows and x chains.
+// axis 1: the points of the y chains (xiExtX); axis 2: those of the x chains.
+// The points come from the chains' marks, so that the pass runs along the
+// rows of the fields whichever the axis; the rows inside the grid without
+// slot or internal generation take a straight pass over j.
 void Extrapolate(int32_t axis, float* xiExt) {
     const GridState& g = gGrid;
     const bool x = axis == 1;
-    const int32_t lines = x ? g.J : g.K;
     const size_t stride = g.Stride();
-    const float *P = g.P.data(), *PPrev = g.PPrev.data(), *Q = g.Q.data(), *QPrev = g.QPrev.data();
-    const float* xiPrev = g.xiPrev.data();
-    const float* xi = g.xi.data();
-    const float* por = gPorosity.porosity.data();
-    const int32_t* codeAlong = x ? gChains.codeX.data() : gChains.codeY.data();
-    const int32_t* codeEnds = x ? gChains.codeY.data() : gChains.codeX.data();
+    const float* __restrict P = g.P.data();
+    const float* __restrict PPrev = g.PPrev.data();
+    const float* __restrict Q = g.Q.data();
+    const float* __restrict QPrev = g.QPrev.data();
+    const float* __restrict xiPrev = g.xiPrev.data();
+    const float* __restrict xi = g.xi.data();
+    const float* __restrict por = gPorosity.porosity.data();
+    const uint8_t* __restrict mark = x ? gChains.surfaceX.data() : gChains.surfaceY.data();
+    float* __restrict out = xiExt;
     const float wP = x ? 0.875f : 0.375f, wPo = x ? 0.125f : 0.625f;
     const float wQ = x ? 0.375f : 0.875f, wQo = x ? 0.625f : 0.125f;
     const bool slot = gShoreline.type > 0;
     const bool gen = gGeneration.numberOfRecords > 0;
     const double dt = g.dt;
     const float dx = g.dx, dy = g.dy;
+
+    // Any point, at the grid's edges too and with every process.
+    auto point = [&](size_t p, int32_t j, int32_t k) {
+        const bool single = mark[p] == 2;
+        const float Pw = j > 0 ? P[p - 1] : g.PWest[k];
+        const float PwO = j > 0 ? PPrev[p - 1] : g.PWest[k];
+        const float Qs = k > 0 ? Q[p - stride] : g.QSouth[j];
+        const float QsO = k > 0 ? QPrev[p - stride] : g.QSouth[j];
+        float sP = 0.0f, sQ = 0.0f;
+        if (gen) {
+            const int32_t s = gGeneration.sourceIndex[p];
+            if (s >= 1) {
+                sP = wP * gGeneration.sourceP[s] + wPo * gGeneration.sourcePPrev[s];
+                sQ = wQ * gGeneration.sourceQ[s] + wQo * gGeneration.sourceQPrev[s];
+            }
+        }
+        const float dPx = (P[p] - Pw) * wP + (PPrev[p] - PwO) * wPo - sP;
+        const float dQy = (Q[p] - Qs) * wQ + (QPrev[p] - QsO) * wQo - sQ;
+        // Along a chain of one point only the flux along the line counts.
+        const float div = single ? (x ? dPx / dx : dQy / dy) : dPx / dx + dQy / dy;
+        const float c = slot ? StorageWidthAt(j, k, xi[p]) : 1.0f;
+        out[p] = static_cast<float>(xiPrev[p] - dt * div / (por[p] * c));
+    };
 #pragma omp parallel for schedule(static)
-    for (int32_t l = 0; l <= lines; ++l) {
-        const int32_t count = x ? gChains.chainCountY[l] : gChains.chainCountX[l];
-        for (int32_t c = 1; c <= count; ++c) {
-            const ChainPair& ch = x ? gChains.Y(l, c) : gChains.X(l, c);
-            auto at = [&](int32_t i) { return x ? g.At(l, i) : g.At(i, l); };
-            const size_t pTest = x ? at(ch.first) : at(ch.last);
-            if (codeEnds[pTest] >= kCodeLevelBoundary) continue;
-            int32_t from = ch.first + 1, to = ch.last - 1;
-            const bool single = ch.first == ch.last;
-            if (single) {
-                from = to = ch.first;
-            } else {
-                if (codeAlong[at(ch.first)] == 2) from = ch.first;
-                if (codeAlong[at(ch.last)] == 3) to = ch.last;
-            }
-            for (int32_t i = from; i <= to; ++i) {
-                const size_t p = at(i);
-                const int32_t j = x ? l : i, k = x ? i : l;
-                const float Pw = j > 0 ? P[p - 1] : g.PWest[k];
-                const float PwO = j > 0 ? PPrev[p - 1] : g.PWest[k];
-                const float Qs = k > 0 ? Q[p - stride] : g.QSouth[j];
-                const float QsO = k > 0 ? QPrev[p - stride] : g.QSouth[j];
-                float sP = 0.0f, sQ = 0.0f;
-                if (gen) {
-                    const int32_t s = gGeneration.sourceIndex[p];
-                    if (s >= 1) {
-                        sP = wP * gGeneration.sourceP[s] + wPo * gGeneration.sourcePPrev[s];
-                        sQ = wQ * gGeneration.sourceQ[s] + wQo * gGeneration.sourceQPrev[s];
-                    }
-                }
-                const float dPx = (P[p] - Pw) * wP + (PPrev[p] - PwO) * wPo - sP;
-                const float dQy = (Q[p] - Qs) * wQ + (QPrev[p] - QsO) * wQo - sQ;
-                // Along a chain of one point only the flux along the line counts.
-                const float div = single ? (x ? dPx / dx : dQy / dy) : dPx / dx + dQy / dy;
-                const float c = slot ? StorageWidthAt(j, k, xi[p]) : 1.0f;
-                xiExt[p] = static_cast<float>(xiPrev[p] - dt * div / (por[p] * c));
-            }
+    for (int32_t k = 0; k <= g.K; ++k) {
+        const size_t o = k * stride;
+        if (k == 0 || slot || gen) {
+            for (int32_t j = 0; j <= g.J; ++j)
+                if (mark[o + j] != 0) point(o + j, j, k);
+            continue;
+        }
+        if (mark[o] != 0) point(o, 0, k);
+        // The same sums as above with no source and a storage width of 1,
+        // computed at every point and kept at the marked ones.
+        for (size_t p = o + 1; p < o + stride; ++p) {
+            const float dPx = (P[p] - P[p - 1]) * wP + (PPrev[p] - PPrev[p - 1]) * wPo;
+            const float dQy = (Q[p] - Q[p - stride]) * wQ + (QPrev[p] - QPrev[p - stride]) * wQo;
+            const float div = mark[p] == 2 ? (x ? dPx / dx : dQy / dy) : dPx / dx + dQy / dy;
+            const float value = static_cast<float>(xiPrev[p] - dt * div / por[p]);
+            out[p] = mark[p] != 0 ? value : out[p];
         }
     }
 }

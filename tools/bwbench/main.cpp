@@ -99,14 +99,22 @@ double BytesPerPoint(int32_t handle) {
 int main(int argc, char** argv) {
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();
-    const double scale = argc > 1 ? std::atof(argv[1]) : 1.0;  // a shorter run for tests
+    // bwbench [scale [n [family [threads]]]]: a shorter run for tests, or one
+    // grid size, sweep family (0 central, 1 and 2 upwind) and thread count to profile.
+    const double scale = argc > 1 ? std::atof(argv[1]) : 1.0;
+    const int32_t onlyN = argc > 2 ? std::atoi(argv[2]) : 0;
+    const int32_t onlyHandle = argc > 3 ? std::atoi(argv[3]) : -1;
+    const int onlyThreads = argc > 4 ? std::atoi(argv[4]) : 0;
     std::printf("%-11s %-11s %7s %13s %13s %8s %8s %9s %8s %8s\n", "grid", "sweeps", "threads",
                 "points/cpu-s", "points/wall-s", "x-sweep", "y-sweep", "copy GB/s", "B/point",
                 "GB/s");
     for (int32_t n : {200, 500, 1000}) {
+        if (onlyN > 0 && n != onlyN) continue;
         const int32_t steps = std::max(2, static_cast<int32_t>(scale * 4e7 / (double(n) * n)));
         for (int32_t handle : {0, 1, 2}) {
+            if (onlyHandle >= 0 && handle != onlyHandle) continue;
             for (int threads : {1, 2}) {
+                if (onlyThreads > 0 && threads != onlyThreads) continue;
                 MakeBasin(n, handle, steps);
                 SetThreads(threads);
                 PrepareTimeLoop();

@@ -98,6 +98,7 @@ void AssembleLineCentral(const AxisView& v, const SweepConstants& s, int32_t k, 
         float* __restrict rC = r + first - 1;
         float* __restrict sNC = sN + first - 1;
         float* __restrict sSC = sS + first - 1;
+#pragma GCC ivdep
         for (int32_t q = 1; q < m; ++q) {
             const double fc = fac[q], nP = nPr[q], dP = dPr[q], p = pr[q];
             const double uW2 = fc * quarter * (p + pr[q - 1]) * inv[q];

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <limits>
+#include <type_traits>
 
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
@@ -17,8 +19,12 @@ namespace {
 const float kNone[1] = {0.0f};
 
 // The rule of neighbours across a line: a land neighbour mirrors the line.
-inline bool NorthAllowed(int32_t code) { return code == 4 || code == 2; }
-inline bool SouthAllowed(int32_t code) { return code == 4 || code == 3; }
+inline bool NorthAllowed(int32_t code) {
+    return code == 4 || code == 2;
+}
+inline bool SouthAllowed(int32_t code) {
+    return code == 4 || code == 3;
+}
 
 // The row of boundary b's table that holds point (j,k) of the grid.
 int32_t TableRow(int32_t b, int32_t j, int32_t k) {
@@ -40,9 +46,9 @@ void ChainRows::Reserve(int32_t points) {
     if (points <= capacity) return;
     capacity = points;
     const size_t n = static_cast<size_t>(points) + 3;
-    for (auto* r : {&p, &pN, &pS, &qC, &qS, &qCo, &qSo, &sE, &sEN, &sES, &dE, &dEN, &dES, &por,
-                    &c, &dpt, &D, &gD, &gDS, &nP, &dP, &DP, &Dx, &Dy, &U, &Fr, &fac, &da, &db, &dc, &dr, &m1,
-                    &m2, &m3, &m4, &rr})
+    for (auto* r : {&p,   &pN,  &pS,  &qC,  &qS, &qCo, &qSo, &sE, &sEN, &sES, &dE, &dEN,
+                    &dES, &por, &c,   &dpt, &D,  &gD,  &gDS, &nP, &dP,  &DP,  &Dx, &Dy,
+                    &U,   &Fr,  &fac, &da,  &db, &dc,  &dr,  &m1, &m2,  &m3,  &m4, &rr})
         r->assign(n, 0.0f);
     src.assign(n, 0);
     for (auto* r : {&uE, &uW, &vN, &vS}) r->assign(n, 0.0);
@@ -63,7 +69,8 @@ AxisView MakeAxisView(int32_t axis) {
         v.across = g.Stride();
         v.ds = g.dx;
         v.dn = g.dy;
-        v.F = g.P.data(), v.FPrev = g.PPrev.data(), v.FDiff = g.pxyt.data(), v.FEdge = g.PWest.data();
+        v.F = g.P.data(), v.FPrev = g.PPrev.data(), v.FDiff = g.pxyt.data(),
+        v.FEdge = g.PWest.data();
         v.G = g.Q.data(), v.GPrev = g.QPrev.data(), v.GDiff = g.qxyt.data();
         v.codeN = gChains.codeX.data(), v.codeE = gChains.codeY.data();
         v.chainCount = &gChains.chainCountX, v.chains = &gChains.chainX;
@@ -81,7 +88,8 @@ AxisView MakeAxisView(int32_t axis) {
         v.depth = g.depth.data(), v.xiPrev = g.xiPrev.data();
         v.friction = gFriction.resistanceType == 2 ? gFriction.frictionCoef.data() : nullptr;
         v.nu = gEddy.eddyViscosity.data();
-        v.delta = gRollers.delta.data(), v.cAlong = gRollers.cx.data(), v.cAcross = gRollers.cy.data();
+        v.delta = gRollers.delta.data(), v.cAlong = gRollers.cx.data(),
+        v.cAcross = gRollers.cy.data();
         v.source = gen ? s.sourceIndex.data() : nullptr;
     } else {
         ColumnCopies& c = gColumns;
@@ -91,7 +99,8 @@ AxisView MakeAxisView(int32_t axis) {
         v.across = static_cast<size_t>(g.K) + 1;
         v.ds = g.dy;
         v.dn = g.dx;
-        v.F = c.Q.data(), v.FPrev = c.QPrev.data(), v.FDiff = c.qxyt.data(), v.FEdge = g.QSouth.data();
+        v.F = c.Q.data(), v.FPrev = c.QPrev.data(), v.FDiff = c.qxyt.data(),
+        v.FEdge = g.QSouth.data();
         v.G = c.P.data(), v.GPrev = c.PPrev.data(), v.GDiff = c.pxyt.data();
         v.codeN = c.codeN.data(), v.codeE = c.codeE.data();
         v.chainCount = &gChains.chainCountY, v.chains = &gChains.chainY;
@@ -162,7 +171,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
     // Point rows. Lines 0 and K are never assembled, so the neighbouring
     // lines exist; their values are taken where the codes allow, else the
     // line's own (selects, so that the passes vectorise).
-    const size_t al = v.along;
+    // Both views run along memory (along is 1), which the passes below use.
     const int32_t* code = v.codeN + base;
     {
         float* __restrict p = w.p.data();
@@ -186,8 +195,9 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         const float* PO = porosity + base;
         const float* DP = depth + base;
         const float* BD = bed + base;
+#pragma GCC ivdep
         for (int32_t r = 1; r <= m; ++r) {
-            const size_t i = (r - 1) * al;
+            const size_t i = r - 1;
             const int32_t cd = code[i];
             const bool nOk = cd == 4 || cd == 2, sOk = cd == 4 || cd == 3;
             p[r] = F0[i];
@@ -208,8 +218,8 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
     }
     if (deep) {
         for (int32_t r = 1; r <= m; ++r) {
-            const size_t pt = base + (r - 1) * al;
-            const int32_t cd = code[(r - 1) * al];
+            const size_t pt = base + (r - 1);
+            const int32_t cd = code[(r - 1)];
             const bool nOk = NorthAllowed(cd), sOk = SouthAllowed(cd);
             w.sE[r] = v.xiExt[pt];
             w.sEN[r] = nOk ? v.xiExt[pt + up] : w.sE[r];
@@ -218,15 +228,15 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
     }
     if (slot) {
         for (int32_t r = 1; r <= m; ++r) {
-            const size_t pt = base + (r - 1) * al;
-            w.c[r] = StorageWidthAt(v.axis == 1 ? first + r - 1 : k, v.axis == 1 ? k : first + r - 1,
-                                    xiPrev[pt]);
+            const size_t pt = base + (r - 1);
+            w.c[r] = StorageWidthAt(v.axis == 1 ? first + r - 1 : k,
+                                    v.axis == 1 ? k : first + r - 1, xiPrev[pt]);
         }
     } else {
         for (int32_t r = 1; r <= m; ++r) w.c[r] = 1.0f;
     }
     if (gen) {
-        for (int32_t r = 1; r <= m; ++r) w.src[r] = v.source[base + (r - 1) * al];
+        for (int32_t r = 1; r <= m; ++r) w.src[r] = v.source[base + r - 1];
         w.src[0] = w.src[m + 1] = 0;
     }
     // Fluxes of the neighbouring lines at the faces: both points must allow.
@@ -235,16 +245,21 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         float* __restrict pS = w.pS.data();
         const float* p = w.p.data();
         const float* F0 = Fold + base;
-        for (int32_t r = 1; r <= m; ++r) {
-            const size_t i = (r - 1) * al;
+        auto face = [&](int32_t r, int32_t c1) {
+            const size_t i = r - 1;
             const int32_t c0 = code[i];
-            const int32_t c1 = first + r - 1 < v.n ? code[i + al] : c0;
-            const bool nOk = (c0 == 4 || c0 == 2) && (c1 == 4 || c1 == 2);
-            const bool sOk = (c0 == 4 || c0 == 3) && (c1 == 4 || c1 == 3);
+            // Bitwise, not short-circuit: no branch in the pass.
+            const bool nOk = ((c0 == 4) | (c0 == 2)) & ((c1 == 4) | (c1 == 2));
+            const bool sOk = ((c0 == 4) | (c0 == 3)) & ((c1 == 4) | (c1 == 3));
             const float fn = F0[i + up], fs = F0[i - up];
             pN[r] = nOk ? fn : p[r];
             pS[r] = sOk ? fs : p[r];
-        }
+        };
+        // The last point of a chain at the line's end has no point beyond:
+        // its own code stands for both.
+#pragma GCC ivdep
+        for (int32_t r = 1; r < m; ++r) face(r, code[r]);
+        face(m, last < v.n ? code[m] : code[m - 1]);
     }
 
     // Ends: land closes the chain; a level boundary brings its outer flux
@@ -272,8 +287,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         const BoundaryTable& t = BoundaryValues(b);
         const int32_t s = TableRow(b, v.axis == 1 ? last : k, v.axis == 1 ? k : last);
         if (Boundary(b).specification == 2) w.p[m] = t.Value(s, v.replaceColumn);
-        if (deep)
-            w.sE[m + 1] = 2.0f * w.sE[m] - w.sE[m - 1] + ds2 * t.Value(s, v.gradientColumn);
+        if (deep) w.sE[m + 1] = 2.0f * w.sE[m] - w.sE[m - 1] + ds2 * t.Value(s, v.gradientColumn);
     } else if (east == 3 && deep) {
         w.sE[m + 1] = w.sE[m];
     }
@@ -288,6 +302,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         float* __restrict DP = w.DP.data();
         float* __restrict Dx = w.Dx.data();
         const float ds = v.ds;
+#pragma GCC ivdep
         for (int32_t r = 1; r < m; ++r) {
             nP[r] = (por[r] + por[r + 1]) * 0.5f;
             dP[r] = (dE[r] + dE[r + 1]) * 0.5f;
@@ -295,18 +310,30 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
             Dx[r] = (D[r + 1] - D[r]) / ds;
         }
     }
-    for (int32_t r = 1; r < m; ++r) {
-        const size_t pt = base + (r - 1) * v.along, pe = pt + v.along;
-        const float D0 = w.D[r], D1 = w.D[r + 1];
-        const float DN0 = NorthAllowed(v.codeN[pt]) ? -bed[pt + up] : D0;
-        const float DS0 = SouthAllowed(v.codeN[pt]) ? -bed[pt - up] : D0;
-        const float DN1 = NorthAllowed(v.codeN[pe]) ? -bed[pe + up] : D1;
-        const float DS1 = SouthAllowed(v.codeN[pe]) ? -bed[pe - up] : D1;
-        w.Dy[r] = static_cast<float>(((static_cast<double>(DN0) - DS0) + (static_cast<double>(DN1) - DS1)) *
-                                     0.25 / v.dn);
+    {
+        // The neighbours' depths are read at every point and kept where the
+        // codes allow (the neighbouring lines exist), so that the pass vectorises.
+        const float* __restrict D = w.D.data();
+        const float* __restrict BN = bed + base + up;
+        const float* __restrict BS = bed + base - up;
+        float* __restrict Dy = w.Dy.data();
+        const double dn = v.dn;
+#pragma GCC ivdep
+        for (int32_t r = 1; r < m; ++r) {
+            const int32_t c0 = code[r - 1], c1 = code[r];
+            const float D0 = D[r], D1 = D[r + 1];
+            const float n0 = -BN[r - 1], s0 = -BS[r - 1], n1 = -BN[r], s1 = -BS[r];
+            const float DN0 = (c0 == 4 || c0 == 2) ? n0 : D0;
+            const float DS0 = (c0 == 4 || c0 == 3) ? s0 : D0;
+            const float DN1 = (c1 == 4 || c1 == 2) ? n1 : D1;
+            const float DS1 = (c1 == 4 || c1 == 3) ? s1 : D1;
+            Dy[r] = static_cast<float>(
+                ((static_cast<double>(DN0) - DS0) + (static_cast<double>(DN1) - DS1)) * 0.25 / dn);
+        }
     }
     if (gen)
-        for (int32_t r = 1; r < m; ++r) w.fac[r] = (w.src[r] >= 1 || w.src[r + 1] >= 1) ? 0.0f : 1.0f;
+        for (int32_t r = 1; r < m; ++r)
+            w.fac[r] = (w.src[r] >= 1 || w.src[r + 1] >= 1) ? 0.0f : 1.0f;
     else
         for (int32_t r = 1; r < m; ++r) w.fac[r] = 1.0f;
 }
@@ -314,26 +341,36 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
 void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
     const int32_t m = last - first + 1;
     const size_t base = v.At(first, k);
+    const float* __restrict qC = w.qC.data();
+    const float* __restrict qS = w.qS.data();
+    const float* __restrict qCo = w.qCo.data();
+    const float* __restrict qSo = w.qSo.data();
+    const float* __restrict p = w.p.data();
+    float* __restrict U = w.U.data();
+    float* __restrict Fr = w.Fr.data();
+#pragma GCC ivdep
+    for (int32_t r = 1; r < m; ++r) {
+        const float qm =
+            (qC[r] + qC[r + 1] + qS[r] + qS[r + 1] + qCo[r] + qCo[r + 1] + qSo[r] + qSo[r + 1]) *
+            0.125f;
+        U[r] = std::sqrt(qm * qm + p[r] * p[r]);
+    }
+    if (gFriction.resistanceType == 0) {
+        for (int32_t r = 1; r < m; ++r) Fr[r] = 0.0f;
+        return;
+    }
     const bool chezy = gFriction.formulation == 1;
     for (int32_t r = 1; r < m; ++r) {
-        const float qm = (w.qC[r] + w.qC[r + 1] + w.qS[r] + w.qS[r + 1] + w.qCo[r] + w.qCo[r + 1] +
-                          w.qSo[r] + w.qSo[r + 1]) *
-                         0.125f;
-        w.U[r] = std::sqrt(qm * qm + w.p[r] * w.p[r]);
-        if (gFriction.resistanceType == 0) {
-            w.Fr[r] = 0.0f;
-            continue;
-        }
         const float F = v.friction != nullptr ? v.friction[base + (r - 1) * v.along]
                                               : gFriction.frictionConstant;
         const float h1 = w.dpt[r], h2 = w.dpt[r + 1];
         const float hf = std::sqrt(2.0f / (1.0f / (h1 * h1) + 1.0f / (h2 * h2)));
         if (chezy) {
-            w.Fr[r] = F / (hf * hf);
+            Fr[r] = F / (hf * hf);
         } else {
             const float x = 0.166667f * std::log(hf);
             const float E = ((x * 0.166667f + 0.5f) * x + 1.0f) * x + 1.0f;
-            w.Fr[r] = F / (hf * hf * E * E);
+            Fr[r] = F / (hf * hf * E * E);
         }
     }
 }
@@ -356,13 +393,16 @@ void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Chain
         const bool sOk = SouthAllowed(c0) && SouthAllowed(c1);
         const size_t n0 = nOk ? p0 + up : p0, n1 = nOk ? p1 + up : p1;
         const size_t s0 = sOk ? p0 - up : p0, s1 = sOk ? p1 - up : p1;
-        const float big = std::max({delta[p0], delta[p1], delta[n0], delta[n1], delta[s0], delta[s1]});
+        const float big =
+            std::max({delta[p0], delta[p1], delta[n0], delta[n1], delta[s0], delta[s1]});
         if (big < 1e-6f) {
             w.rr[r] = 0.0f;
             continue;
         }
-        const double dN = (static_cast<double>(w.dEN[r]) + w.dE[r] + w.dE[r + 1] + w.dEN[r + 1]) * 0.25;
-        const double dS = (static_cast<double>(w.dE[r]) + w.dE[r + 1] + w.dES[r] + w.dES[r + 1]) * 0.25;
+        const double dN =
+            (static_cast<double>(w.dEN[r]) + w.dE[r] + w.dE[r + 1] + w.dEN[r + 1]) * 0.25;
+        const double dS =
+            (static_cast<double>(w.dE[r]) + w.dE[r + 1] + w.dES[r] + w.dES[r + 1]) * 0.25;
         auto mean = [&](const float* a, size_t x0, size_t x1, size_t x2, size_t x3) {
             return (static_cast<double>(a[x0]) + a[x1] + a[x2] + a[x3]) * 0.25;
         };
@@ -373,9 +413,12 @@ void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Chain
                              (caN - ((static_cast<double>(w.pN[r]) + w.p[r]) * 0.5) / dN);
         const double south = (ccS - 2.0 * (w.qS[r] + w.qS[r + 1]) / (4.0 * dS)) * wf(deltaS, dS) *
                              (caS - ((static_cast<double>(w.p[r]) + w.pS[r]) * 0.5) / dS);
-        const double ex0 = cAlong[p0] - ((static_cast<double>(w.p[r - 1]) + w.p[r]) * 0.5) / w.dE[r];
-        const double ex1 = cAlong[p1] - ((static_cast<double>(w.p[r]) + w.p[r + 1]) * 0.5) / w.dE[r + 1];
-        const double along = wf(delta[p1], w.dE[r + 1]) * ex1 * ex1 - wf(delta[p0], w.dE[r]) * ex0 * ex0;
+        const double ex0 =
+            cAlong[p0] - ((static_cast<double>(w.p[r - 1]) + w.p[r]) * 0.5) / w.dE[r];
+        const double ex1 =
+            cAlong[p1] - ((static_cast<double>(w.p[r]) + w.p[r + 1]) * 0.5) / w.dE[r + 1];
+        const double along =
+            wf(delta[p1], w.dE[r + 1]) * ex1 * ex1 - wf(delta[p0], w.dE[r]) * ex0 * ex0;
         w.rr[r] = static_cast<float>(-(north - south) / v.dn - along / v.ds);
     }
 }
@@ -451,9 +494,9 @@ void DispersionSourceRows(const AxisView& v, const SweepConstants& s, int32_t fi
             s3 -= static_cast<double>(v.sGPrev[i]) - v.sGPrev2[i];
         }
         const double nP = w.nP[r], dP = w.dP[r], DP = w.DP[r];
-        const double fe = varying ? (w.D[r] >= e.waterDepthLimit ? e.extrapolationUpper
-                                                                  : e.extrapolationLower)
-                                  : e.extrapolationLower;
+        const double fe =
+            varying ? (w.D[r] >= e.waterDepthLimit ? e.extrapolationUpper : e.extrapolationLower)
+                    : e.extrapolationLower;
         const bool plain = 1.0 - nP >= 0.0001 && gPorosity.noExtrapolation;
         const double E1 = plain ? 1.0 : 1.0 + fe * 0.5, E2 = plain ? 0.0 : fe * 0.5;
         double G = dP * nP * s.g1 + s.g2 - DP * DP * nP * s.g3;
@@ -488,11 +531,12 @@ void DeepWaterRows(const AxisView& v, const SweepConstants& s, int32_t first, in
             if (i2 >= 1) xxx -= v.sXiAlong[i2] * idx2, xyy -= v.sXiAcross[i2] * idxdy;
         }
         const double xx = (xx1 + xx0) * 0.5;
-        const double xy = ((static_cast<double>(sEN[r + 1]) - sES[r + 1] - sEN[r] + sES[r]) * 0.5) * idxdy;
+        const double xy =
+            ((static_cast<double>(sEN[r + 1]) - sES[r + 1] - sEN[r] + sES[r]) * 0.5) * idxdy;
         const double nP = w.nP[r], DP = w.DP[r];
-        w.dr[r] = static_cast<float>(
-            w.dr[r] + Bg * DP * DP * nP * nP *
-                          (w.Dx[r] * (2.0 * xx + (yy1 + yy0) * 0.5) + w.Dy[r] * xy + DP * (xxx + xyy)));
+        w.dr[r] = static_cast<float>(w.dr[r] + Bg * DP * DP * nP * nP *
+                                                   (w.Dx[r] * (2.0 * xx + (yy1 + yy0) * 0.5) +
+                                                    w.Dy[r] * xy + DP * (xxx + xyy)));
     }
 }
 
@@ -526,35 +570,51 @@ void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32
     float* __restrict db = w.db.data();
     float* __restrict dc = w.dc.data();
     float* __restrict dr = w.dr.data();
-    for (int32_t r = 1; r < m; ++r) {
-        // Central sweeps test the face's still water depth, the upwind ones the bed at j.
-        const bool on = central ? DPr[r] > 0.0f : D[r] > 0.0f;
-        const double nP = nPr[r], dP = dPr[r], DP = DPr[r], Dx = Dxr[r], Dy = Dyr[r];
-        const bool porous = 1.0 - nP >= 0.0001;
-        const double fe = varying ? (D[r] >= limit ? upper : lower) : lower;
-        const bool plain = porous && noExtrapolation;
-        const double E1 = plain ? 1.0 : 1.0 + fe * 0.5, E2 = plain ? 0.0 : fe * 0.5;
-        // Time differences of G at the four corners of the face, extrapolated.
-        const double t1 = (static_cast<double>(qC[r + 1]) - qCo[r + 1]) * E1 - gD[r + 1] * E2;
-        const double t2 = (static_cast<double>(qS[r + 1]) - qSo[r + 1]) * E1 - gDS[r + 1] * E2;
-        const double t3 = (static_cast<double>(qC[r]) - qCo[r]) * E1 - gD[r] * E2;
-        const double t4 = (static_cast<double>(qS[r]) - qSo[r]) * E1 - gDS[r] * E2;
-        const double A1 = DP * nP * a1;
-        double G = dP * nP * g1 + g2 - DP * DP * nP * g3;
-        if (central) G = static_cast<float>(G);
-        const double H1 = 2.0 * A1 * Dx;
-        const double pE = p[r + 1], pC = p[r], pW = p[r - 1];
-        const double cross = dP * nP * x1 + DP * DP * nP * x2;
-        const double sum = (-(pE - pW) * 2.0 * A1 + DP * nP * t0 * (t1 - t2 + t3 - t4)) * Dx +
-                           G * (pE - 2.0 * pC + pW) + cross * (t1 - t2 - t3 + t4) +
-                           Dy * A1 * (t1 + t2 - t3 - t4);
-        const double q = 1.0 - nP;
-        const double dbv = -2.0 * G + (porous ? alpha * q * q * q : 0.0);
-        da[r] = on ? static_cast<float>(H1 + G) : 0.0f;
-        db[r] = on ? static_cast<float>(dbv) : 0.0f;
-        dc[r] = on ? static_cast<float>(G - H1) : 0.0f;
-        dr[r] = on ? static_cast<float>(sum) : 0.0f;
-    }
+    // Central sweeps test the face's still water depth, the upwind ones the
+    // bed at j; without depth-varying extrapolation no depth reaches the limit.
+    const float* __restrict onDepth = central ? DPr : D;
+    const float feLimit = varying ? limit : std::numeric_limits<float>::infinity();
+    // One pass for each kind of sweep, so that the rounding of G is no
+    // select inside the loop.
+    auto pass = [&](auto kind) {
+        constexpr bool kCentral = decltype(kind)::value;
+#pragma GCC ivdep
+        for (int32_t r = 1; r < m; ++r) {
+            const double nP = nPr[r], dP = dPr[r], DP = DPr[r], Dx = Dxr[r], Dy = Dyr[r];
+            const bool porous = 1.0 - nP >= 0.0001;
+            const double fe = D[r] >= feLimit ? upper : lower;
+            const bool plain = porous & noExtrapolation;
+            const double E1 = plain ? 1.0 : 1.0 + fe * 0.5, E2 = plain ? 0.0 : fe * 0.5;
+            // Time differences of G at the four corners of the face, extrapolated.
+            const double t1 = (static_cast<double>(qC[r + 1]) - qCo[r + 1]) * E1 - gD[r + 1] * E2;
+            const double t2 = (static_cast<double>(qS[r + 1]) - qSo[r + 1]) * E1 - gDS[r + 1] * E2;
+            const double t3 = (static_cast<double>(qC[r]) - qCo[r]) * E1 - gD[r] * E2;
+            const double t4 = (static_cast<double>(qS[r]) - qSo[r]) * E1 - gDS[r] * E2;
+            const double A1 = DP * nP * a1;
+            const double G0 = dP * nP * g1 + g2 - DP * DP * nP * g3;
+            const double G = kCentral ? static_cast<double>(static_cast<float>(G0)) : G0;
+            const double H1 = 2.0 * A1 * Dx;
+            const double pE = p[r + 1], pC = p[r], pW = p[r - 1];
+            const double cross = dP * nP * x1 + DP * DP * nP * x2;
+            const double sum = (-(pE - pW) * 2.0 * A1 + DP * nP * t0 * (t1 - t2 + t3 - t4)) * Dx +
+                               G * (pE - 2.0 * pC + pW) + cross * (t1 - t2 - t3 + t4) +
+                               Dy * A1 * (t1 + t2 - t3 - t4);
+            const double q = 1.0 - nP;
+            const double dbv = -2.0 * G + (porous ? alpha * q * q * q : 0.0);
+            da[r] = static_cast<float>(H1 + G);
+            db[r] = static_cast<float>(dbv);
+            dc[r] = static_cast<float>(G - H1);
+            dr[r] = static_cast<float>(sum);
+        }
+    };
+    if (central)
+        pass(std::true_type{});
+    else
+        pass(std::false_type{});
+    // Faces without depth have no dispersion terms (a pass of its own, so
+    // that the one above has no branch).
+    for (int32_t r = 1; r < m; ++r)
+        if (!(onDepth[r] > 0.0f)) da[r] = db[r] = dc[r] = dr[r] = 0.0f;
     if (gGeneration.numberOfRecords > 0) DispersionSourceRows(v, s, first, last, central, w);
     if (e.deepWaterTerms) DeepWaterRows(v, s, first, last, central, w);
 }
@@ -565,6 +625,32 @@ void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, b
     const float* xi = v.xi;
     const size_t base = v.At(first, k);
     const double f4 = 4.0 * v.ds / gGrid.dt, ratio = static_cast<double>(v.ds) / v.dn;
+    const bool gen = gGeneration.numberOfRecords > 0;
+    const float* __restrict cw = w.c.data();
+    const float* __restrict p = w.p.data();
+    const float* __restrict qC = w.qC.data();
+    const float* __restrict qS = w.qS.data();
+    const float* __restrict qCo = w.qCo.data();
+    const float* __restrict qSo = w.qSo.data();
+    const float* __restrict por = w.por.data();
+    const float* __restrict xiC = xi + base - 1;  // xiC[r] is xi at point first + r - 1
+    if (!gen) {
+        // The pass below without sources, which vectorises; cP and cQ stay
+        // as the zeros they are there, so that a -0 sum becomes +0 alike.
+#pragma GCC ivdep
+        for (int32_t r = 1; r <= m; ++r) {
+            const double c = cw[r], cc1 = c / (2.0 - c);
+            const double bc = (central ? cc1 : c) * f4 * por[r];
+            const float bcs = static_cast<float>(bc);
+            Bc[r] = bcs;
+            Rc[r] = static_cast<float>(static_cast<double>(bcs) * xiC[r] -
+                                       (static_cast<double>(p[r]) - p[r - 1]) * cc1 + 0.0 -
+                                       ((static_cast<double>(qC[r]) - qS[r]) +
+                                        cc1 * (static_cast<double>(qCo[r]) - qSo[r]) - 0.0) *
+                                           ratio);
+        }
+        return;
+    }
     for (int32_t r = 1; r <= m; ++r) {
         const double c = w.c[r], cc1 = c / (2.0 - c);
         const int32_t i = w.src[r];
@@ -573,10 +659,10 @@ void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, b
         const double bc = (central ? cc1 : c) * f4 * w.por[r];
         const float bcs = static_cast<float>(bc);
         Bc[r] = bcs;
-        Rc[r] = static_cast<float>(
-            static_cast<double>(bcs) * xi[base + (r - 1) * v.along] -
-            (static_cast<double>(w.p[r]) - w.p[r - 1]) * cc1 + cP -
-            ((static_cast<double>(w.qC[r]) - w.qS[r]) + cc1 * (static_cast<double>(w.qCo[r]) - w.qSo[r]) - cQ) *
-                ratio);
+        Rc[r] = static_cast<float>(static_cast<double>(bcs) * xi[base + r - 1] -
+                                   (static_cast<double>(w.p[r]) - w.p[r - 1]) * cc1 + cP -
+                                   ((static_cast<double>(w.qC[r]) - w.qS[r]) +
+                                    cc1 * (static_cast<double>(w.qCo[r]) - w.qSo[r]) - cQ) *
+                                       ratio);
     }
 }

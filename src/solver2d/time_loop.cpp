@@ -153,6 +153,7 @@ void Extrapolate(int32_t axis, float* xiExt) {
         if (mark[o] != 0) point(o, 0, k);
         // The same sums as above with no source and a storage width of 1,
         // computed at every point and kept at the marked ones.
+#pragma GCC ivdep
         for (size_t p = o + 1; p < o + stride; ++p) {
             const float dPx = (P[p] - P[p - 1]) * wP + (PPrev[p] - PPrev[p - 1]) * wPo;
             const float dQy = (Q[p] - Q[p - stride]) * wQ + (QPrev[p] - QPrev[p - stride]) * wQo;

@@ -26,8 +26,6 @@
 
 namespace {
 
-inline bool NorthAllowed(int32_t code) { return code == 4 || code == 2; }
-inline bool SouthAllowed(int32_t code) { return code == 4 || code == 3; }
 
 // Grid numbers (j,k) of position i along line l.
 inline int32_t GridJ(const AxisView& v, int32_t i, int32_t l) { return v.axis == 1 ? i : l; }
@@ -300,12 +298,19 @@ void SolveLineCentral(const AxisView& v, const SweepConstants& s, int32_t k) {
         for (int32_t c = count - 1; c >= 0; --c) {
             const int32_t first = v.Chain(k, c).first, last = v.Chain(k, c).last;
             if (v.codeN[v.At(last, k)] >= kCodeLevelBoundary) continue;
+            // Faces j < last < n: the point beyond always exists. Bitwise
+            // tests and selects, so that the pass vectorises.
+            const size_t o = v.At(0, k);
+            const int32_t* __restrict code = v.codeN + o;
+            const float* __restrict Pc = P + o;
+#pragma GCC ivdep
             for (int32_t j = first; j < last; ++j) {
-                const size_t pt = v.At(j, k);
-                const int32_t c0 = v.codeN[pt];
-                const int32_t c1 = j < v.n ? v.codeN[pt + v.along] : c0;
-                const float PN = (NorthAllowed(c0) && NorthAllowed(c1)) ? P[pt + up] : P[pt];
-                const float PS = (SouthAllowed(c0) && SouthAllowed(c1)) ? P[pt - up] : P[pt];
+                const int32_t c0 = code[j], c1 = code[j + 1];
+                const bool nOk = ((c0 == 4) | (c0 == 2)) & ((c1 == 4) | (c1 == 2));
+                const bool sOk = ((c0 == 4) | (c0 == 3)) & ((c1 == 4) | (c1 == 3));
+                const float pc = Pc[j], pn = Pc[j + up], ps = Pc[j - up];
+                const float PN = nOk ? pn : pc;
+                const float PS = sOk ? ps : pc;
                 r[j] += sN[j] * PN + sS[j] * PS;
             }
         }

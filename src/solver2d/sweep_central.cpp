@@ -26,7 +26,6 @@
 
 namespace {
 
-
 // Grid numbers (j,k) of position i along line l.
 inline int32_t GridJ(const AxisView& v, int32_t i, int32_t l) { return v.axis == 1 ? i : l; }
 inline int32_t GridK(const AxisView& v, int32_t i, int32_t l) { return v.axis == 1 ? l : i; }
@@ -38,6 +37,7 @@ int32_t TableRow(int32_t b, int32_t j, int32_t k) {
 
 void SweepCentralOn(int32_t axis, bool lineOrderFlag);
 
+BW_VECTOR_CLONES
 void AssembleLineCentral(const AxisView& v, const SweepConstants& s, int32_t k, int32_t flag,
                          ChainRows& w) {
     SweepBuffers& sb = gSweepBuffers;

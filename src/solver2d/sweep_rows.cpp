@@ -154,6 +154,7 @@ void CheckChainDepth(const AxisView& v, int32_t k, int32_t first, int32_t last) 
     }
 }
 
+BW_VECTOR_CLONES
 void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
                    ChainRows& w) {
     const int32_t m = last - first + 1;
@@ -338,6 +339,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         for (int32_t r = 1; r < m; ++r) w.fac[r] = 1.0f;
 }
 
+BW_VECTOR_CLONES
 void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
     const int32_t m = last - first + 1;
     const size_t base = v.At(first, k);
@@ -542,6 +544,7 @@ void DeepWaterRows(const AxisView& v, const SweepConstants& s, int32_t first, in
 
 }  // namespace
 
+BW_VECTOR_CLONES
 void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32_t first,
                     int32_t last, bool central, ChainRows& w) {
     (void)k;
@@ -619,6 +622,7 @@ void DispersionRows(const AxisView& v, const SweepConstants& s, int32_t k, int32
     if (e.deepWaterTerms) DeepWaterRows(v, s, first, last, central, w);
 }
 
+BW_VECTOR_CLONES
 void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bool central,
                     const ChainRows& w, float* Bc, float* Rc) {
     const int32_t m = last - first + 1;

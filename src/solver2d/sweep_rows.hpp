@@ -18,6 +18,16 @@
 
 #include "solver2d/model_state.hpp"
 
+// The passes over a chain's rows are compiled twice on x86-64: for the
+// processor every such machine has, and for one with 256-bit vectors, chosen
+// when the program loads. Without contraction into fused multiply-adds the
+// two give the same results to the last bit.
+#if defined(__x86_64__) && defined(__GNUC__) && !defined(__clang__)
+#define BW_VECTOR_CLONES __attribute__((target_clones("avx2", "default")))
+#else
+#define BW_VECTOR_CLONES
+#endif
+
 struct AxisView {
     int32_t axis = 1;           // 1: x-sweep, 2: y-sweep
     int32_t n = 0;              // highest index along a line (J)

@@ -44,6 +44,7 @@ Weights SchemeWeights(int32_t handle) {
 
 // Adds the implicit convection in x and the explicit convection in y of the
 // faces of a chain to the rows aa..cc and r (face q at index first + q - 1).
+BW_VECTOR_CLONES
 void ConvectionTerms(const AxisView& v, int32_t k, int32_t first, int32_t last, const ChainRows& w,
                      const double* uE, const double* uW, const double* vN, const double* vS,
                      float* aa, float* a, float* b, float* c, float* cc, float* r) {
@@ -120,6 +121,7 @@ void ConvectionTerms(const AxisView& v, int32_t k, int32_t first, int32_t last, 
     }
 }
 
+BW_VECTOR_CLONES
 void AssembleLine(const AxisView& v, const SweepConstants& s, int32_t k, int32_t flag,
                   ChainRows& w) {
     SweepBuffers& sb = gSweepBuffers;

@@ -220,6 +220,9 @@ TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
     bwtest::WriteMapFile(dir / "bogus.xol2", bare, Bed());
     EXPECT_EXIT(Read({}, "bogus.xol2"), testing::ExitedWithCode(1),
                 "Unable to initialize the cartography module");
+    bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0, {{0.0f, 1.0f}});
+    EXPECT_EXIT(Read({{"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("series.xol0")}}),
+                testing::ExitedWithCode(1), "ERR_XOL_NOT2D");
     bwtest::MapSpec wide = spec;
     wide.J = 7;
     bwtest::WriteMapFile(dir / "wide.xol2", wide, bwtest::Constant(wide, 1.0f));

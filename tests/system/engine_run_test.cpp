@@ -132,6 +132,15 @@ TEST_F(EngineRun, MissingTargetOrSectionStopsTheRun) {
     EXPECT_EQ(r.out, "KVT section: BASIC_MODEL_PARAMETERS not found\n");
 }
 
+TEST_F(EngineRun, AProgressChannelThatCannotBeMadeStopsTheRun) {
+    WriteSmallModel(dir, "m.bw");
+    fs::create_directory(dir / "m._spi_");  // a folder where the channel should be
+    RunResult r = Run({"m.bw"});
+    EXPECT_EQ(r.exitCode, 1);
+    EXPECT_EQ(r.out, "Unable to open Hud2 message file: m._spi_\n");
+    EXPECT_EQ(LastLine(dir / "m.log"), "Abnormal completion");
+}
+
 TEST_F(EngineRun, UnderALauncherEachProcessWritesItsOwnFiles) {
     WriteSmallModel(dir, "basin.bw");
     const std::string mpirun = "/usr/bin/mpirun";

@@ -16,6 +16,7 @@
 #include "processes/internal_generation.hpp"
 #include "processes/porosity.hpp"
 #include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
 #include "run/messages.hpp"
 #include "solver2d/sweep_rows.hpp"
 
@@ -107,7 +108,7 @@ void CopyColumnsIn() {
     const GridState& g = gGrid;
     ColumnCopies& c = gColumns;
     In(g.depth, c.depth);
-    In(g.xiPrev, c.xiPrev);
+    if (gShoreline.type > 0) In(g.xiPrev, c.xiPrev);  // read only by the slot's storage width
     In(g.xi, c.xi);
     In(g.Q, c.Q);
     In(g.QPrev, c.QPrev);

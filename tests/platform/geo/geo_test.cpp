@@ -1,11 +1,13 @@
+// The map frame. Where a number is PROJ's to know (a projected point, the
+// direction of a meridian on the map) it is checked against the cs2cs
+// program of the PROJ tools; model coordinates against the grid's turn.
 #include "platform/geo/geo.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <cstdio>
+#include <iomanip>
 #include <sstream>
-#include <tuple>
 #include <utility>
 #include <vector>
 
@@ -13,220 +15,194 @@
 
 namespace {
 
-// Transforms points with the cs2cs program of the PROJ tools: the two
-// coordinates of each in the order the source CRS wants them, the two results
-// in the order of the target CRS.
-std::vector<std::pair<double, double>> Cs2cs(const std::string& crsPair,
-                                             const std::vector<std::pair<double, double>>& in) {
-    bwtest::TempDir dir;
-    std::string input;
-    for (const auto& [a, b] : in) {
-        char line[64];
-        std::snprintf(line, sizeof line, "%.10f %.10f\n", a, b);
-        input += line;
-    }
-    bwtest::WriteFile(dir / "in.txt", input);
-    auto r = bwtest::RunProgram({"/bin/sh", "-c", "cs2cs -f %.6f " + crsPair + " < in.txt"},
-                                dir.path.string());
-    std::vector<std::pair<double, double>> out;
+using Points = std::vector<std::pair<double, double>>;
+
+// Transforms points with cs2cs ("<from> <to>" or "<from> +to <to>"), the two
+// coordinates of each in the order its CRS wants them.
+Points Cs2cs(const std::string& crsPair, const Points& in) {
+    std::ostringstream input;
+    input << std::fixed << std::setprecision(10);
+    for (const auto& [a, b] : in) input << a << " " << b << "\n";
+    const auto r = bwtest::RunProgramWithInput({"/bin/sh", "-c", "cs2cs -f %.6f " + crsPair}, ".",
+                                               input.str());
+    Points out;
     std::istringstream lines(r.out);
-    std::string line;
-    while (r.exitCode == 0 && std::getline(lines, line)) {
-        std::istringstream fields(line);
-        double a = 0, b = 0;
-        if (fields >> a >> b) out.emplace_back(a, b);
-    }
+    double a = 0, b = 0;
+    for (std::string line; r.exitCode == 0 && std::getline(lines, line);)
+        if (std::istringstream(line) >> a >> b) out.emplace_back(a, b);
     return out;
 }
 
-bool Cs2cs(const std::string& crsPair, double a, double b, double& out1, double& out2) {
-    const auto out = Cs2cs(crsPair, {{a, b}});
-    if (out.size() != 1) return false;
-    std::tie(out1, out2) = out[0];
-    return true;
-}
-
-bool Cs2csFromWgs84(const std::string& crs, double lon, double lat, double& east, double& north) {
-    return Cs2cs("+proj=longlat +datum=WGS84 +to " + crs, lon, lat, east, north);
-}
-
+// For each text, at points left and right of the origin: the point projected
+// from WGS 84 as cs2cs does it (cs2cs prints micrometres), and back to within
+// a millimetre (far below what 32-bit coordinates in a file keep); true north
+// there, against a step of 0.001 degrees north and south on the projection's
+// own datum projected by cs2cs, less the grid's orientation (north on a
+// shifted datum differs from that of WGS 84 by a few arcseconds: the frame
+// takes the projection's own). Then the WKT a data file gets (of a CRS, never
+// of a bare conversion) and the projection's own origin (natural origin,
+// false origin or centre).
 TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
     const struct {
         const char* projection;
-        const char* crs;
-        double lon, lat;
-    } cases[] = {
-        {"UTM-32", "EPSG:32632", 9.5, 54.25},
-        {"UTM-31", "EPSG:32631", 4.1, 52.0},
-        {"EPSG:28992", "EPSG:28992", 4.9, 52.37},
-        {"+proj=tmerc +lat_0=0 +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84 +units=m",
-         "+proj=tmerc +lat_0=0 +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84 +units=m", 3.7, 51.3}};
-    for (const auto& c : cases) {
-        GeoHandle frame = 0;
-        ASSERT_EQ(GeoOpen(&frame, c.projection, c.lon, c.lat, 0.0), 0) << GeoLastError();
-        for (double dlon : {0.0, 0.05, -0.2}) {
-            double e1 = 0, n1 = 0, e2 = 0, n2 = 0;
-            ASSERT_EQ(GeoGeo2Proj(frame, c.lon + dlon, c.lat - dlon, e1, n1), 0);
-            ASSERT_TRUE(Cs2csFromWgs84(c.crs, c.lon + dlon, c.lat - dlon, e2, n2)) << c.crs;
-            EXPECT_NEAR(e1, e2, 1e-5) << c.projection;  // cs2cs prints micrometres
-            EXPECT_NEAR(n1, n2, 1e-5) << c.projection;
-            double lon = 0, lat = 0;
-            GeoProj2Geo(frame, e1, n1, lon, lat);
-            // Back to within a millimetre: far below what 32-bit coordinates in a file keep.
-            EXPECT_NEAR(lon, c.lon + dlon, 1e-8);
-            EXPECT_NEAR(lat, c.lat - dlon, 1e-8);
-        }
-        GeoClose(frame);
-    }
-}
-
-TEST(MapFrame, ModelCoordinatesTurnWithTheGrid) {
-    GeoHandle frame = 0;
-    ASSERT_EQ(GeoOpen(&frame, "UTM-32", 9.5, 54.25, 30.0), 0);
-    double lon = 0, lat = 0;
-    GeoXy2Geo(frame, 0.0, 0.0, lon, lat);
-    EXPECT_NEAR(lon, 9.5, 1e-12);  // the model's origin is the origin given
-    EXPECT_NEAR(lat, 54.25, 1e-12);
-    double e0 = 0, n0 = 0, e = 0, n = 0;
-    GeoXy2Proj(frame, 0.0, 0.0, e0, n0);
-    GeoXy2Proj(frame, 0.0, 100.0, e, n);  // 100 m along the grid's y axis, 30 degrees east of north
-    EXPECT_NEAR(e - e0, 50.0, 1e-9);
-    EXPECT_NEAR(n - n0, 100.0 * std::cos(M_PI / 6), 1e-9);
-    double x = 0, y = 0;
-    GeoGeo2Xy(frame, 9.6, 54.3, x, y);
-    GeoXy2Geo(frame, x, y, lon, lat);
-    EXPECT_NEAR(lon, 9.6, 1e-10);
-    EXPECT_NEAR(lat, 54.3, 1e-10);
-    double north = 0;
-    GeoProjectionNorth(frame, north);
-    EXPECT_EQ(north, -30.0);
-    GeoClose(frame);
-}
-
-// True north at a point, against cs2cs: a short step due north on the
-// projection's own datum, projected, gives the direction of the meridian on
-// the map. Cases: a turned grid, a datum other than WGS 84, a CRS with a
-// height, a PROJ string with a datum shift, a point far from the central
-// meridian. (North on a shifted datum differs from that of WGS 84 by a few
-// arcseconds; the frame takes the projection's own.)
-TEST(MapFrame, TrueNorthFollowsTheMeridianConvergence) {
-    const struct {
-        const char* projection;
-        const char* cs2cs;  // from the projection's geographic CRS to the projection
-        bool latFirst;      // the geographic CRS wants latitude first
+        const char* crs;         // the CRS for cs2cs, its projected part alone,
+        const char* horizontal;  // and that part's geographic CRS (latitude first
+        const char* base;        // when latFirst)
+        bool latFirst;
         double lon, lat, orientation;
+        const char* wkt;
+        double originLon, originLat;
     } cases[] = {
-        {"UTM-32", "+proj=longlat +datum=WGS84 +to EPSG:32632", false, 9.5, 54.25, 30.0},
-        {"EPSG:27700", "EPSG:4277 EPSG:27700", true, -1.5, 53.0, -12.0},
-        {"EPSG:25832+5783", "EPSG:4258 EPSG:25832", true, 8.0, 50.0, 0.0},
+        {"UTM-32", "EPSG:32632", "EPSG:32632", "EPSG:4326", true, 9.5, 54.25, 30.0, "PROJCRS", 9.0,
+         0.0},
+        {"+proj=utm +zone=31 +datum=WGS84", "EPSG:32631", "EPSG:32631", "EPSG:4326", true, 4.1,
+         52.0, 0.0, "PROJCRS", 3.0, 0.0},
+        {"EPSG:28992", "EPSG:28992", "EPSG:28992", "EPSG:4289", true, 4.9, 52.37, 0.0, "PROJCRS",
+         5.38763888888889, 52.1561605555556},  // oblique stereographic
+        {"EPSG:27700", "EPSG:27700", "EPSG:27700", "EPSG:4277", true, -1.5, 53.0, -12.0, "PROJCRS",
+         -2.0, 49.0},
+        {"EPSG:25832+5783", "EPSG:25832", "EPSG:25832", "EPSG:4258", true, 8.0, 50.0, 0.0,
+         "COMPOUNDCRS", 9.0, 0.0},  // with a height: the code of the pair
         {"+proj=utm +zone=32 +ellps=intl +towgs84=-87,-98,-121",
-         "+proj=longlat +ellps=intl +type=crs +to +proj=utm +zone=32 +ellps=intl +type=crs", false,
-         10.0, 56.0, 5.0},
-        {"+proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84",
-         "+proj=longlat +datum=WGS84 +to +proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84",
-         false, 7.0, 51.0, 0.0},
+         "+proj=utm +zone=32 +ellps=intl +towgs84=-87,-98,-121 +type=crs",
+         "+proj=utm +zone=32 +ellps=intl +type=crs", "+proj=longlat +ellps=intl +type=crs", false,
+         10.0, 56.0, 5.0, "BOUNDCRS", 9.0, 0.0},
+        {"+proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84", "EPSG:32631", "EPSG:32631",
+         "EPSG:4326", true, 7.0, 51.0, 0.0, "PROJCRS", 3.0, 0.0},  // zone 31, unnamed
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(c.projection);
         GeoHandle frame = 0;
-        ASSERT_EQ(GeoOpen(&frame, c.projection, c.lon, c.lat, c.orientation), 0)
-            << c.projection << ": " << GeoLastError();
-        for (double plon : {c.lon - 1.5, c.lon + 2.0}) {
-            // The point and steps of 0.001 degrees north and south of it.
-            std::vector<std::pair<double, double>> points;
+        ASSERT_EQ(GeoOpen(&frame, c.projection, c.lon, c.lat, c.orientation), 0) << GeoLastError();
+        const double lons[] = {c.lon - 1.5, c.lon + 2.0};
+        const Points projected =
+            Cs2cs(std::string("EPSG:4326 +to ") + c.crs, {{c.lat, lons[0]}, {c.lat, lons[1]}});
+        ASSERT_EQ(projected.size(), 2u);
+        for (int k = 0; k < 2; ++k) {
+            double east = 0, north = 0, lon = 0, lat = 0, x = 0, y = 0, degrees = 0;
+            ASSERT_EQ(GeoGeo2Proj(frame, lons[k], c.lat, east, north), 0);
+            EXPECT_NEAR(east, projected[k].first, 1e-5);
+            EXPECT_NEAR(north, projected[k].second, 1e-5);
+            ASSERT_EQ(GeoProj2Geo(frame, east, north, lon, lat), 0);
+            const double metres =
+                std::hypot((lon - lons[k]) * std::cos(c.lat * M_PI / 180), lat - c.lat) * 111e3;
+            EXPECT_LT(metres, 1e-3) << lon << " " << lat;
+
+            Points steps;
             for (double dlat : {0.0, 1e-3, -1e-3})
-                points.emplace_back(c.latFirst ? std::make_pair(c.lat + dlat, plon)
-                                               : std::make_pair(plon, c.lat + dlat));
-            const auto p = Cs2cs(c.cs2cs, points);
-            ASSERT_EQ(p.size(), 3u) << c.cs2cs;
-            // The meridian's direction on the map, then on the grid turned by the orientation.
-            const double expected =
-                std::atan2(p[1].first - p[2].first, p[1].second - p[2].second) * 180.0 / M_PI -
-                c.orientation;
-            double x = 0, y = 0, degrees = 0;
+                steps.push_back(c.latFirst ? std::make_pair(c.lat + dlat, lons[k])
+                                           : std::make_pair(lons[k], c.lat + dlat));
+            const Points p = Cs2cs(std::string(c.base) + " +to " + c.horizontal, steps);
+            ASSERT_EQ(p.size(), 3u);
+            const double meridian =
+                std::atan2(p[1].first - p[2].first, p[1].second - p[2].second) * 180.0 / M_PI;
             GeoProj2Xy(frame, p[0].first, p[0].second, x, y);
-            ASSERT_EQ(GeoTrueNorth(frame, x, y, degrees), 0) << c.projection;
-            EXPECT_NEAR(degrees, expected, 1e-6) << c.projection << " at " << plon;
+            ASSERT_EQ(GeoTrueNorth(frame, x, y, degrees), 0);
+            EXPECT_NEAR(degrees, meridian - c.orientation, 1e-6) << "at " << lons[k];
         }
-        // Whatever the text, the data files get the WKT of a CRS, not of a bare conversion.
         std::string wkt;
         GeoCrsWkt(frame, wkt);
-        EXPECT_TRUE(wkt.rfind("PROJCRS[", 0) == 0 || wkt.rfind("COMPOUNDCRS[", 0) == 0 ||
-                    wkt.rfind("BOUNDCRS[", 0) == 0)
-            << c.projection << ": " << wkt.substr(0, 40);
+        EXPECT_EQ(wkt.substr(0, wkt.find('[')), c.wkt) << wkt.substr(0, 40);
+        GeoClose(frame);
+        double lon = -1, lat = -1;
+        ASSERT_EQ(GeoProjectionOrigin(c.projection, lon, lat), 0);
+        EXPECT_NEAR(lon, c.originLon, 1e-9);
+        EXPECT_NEAR(lat, c.originLat, 1e-9);
+    }
+}
+
+// Model coordinates: (0, 0) is the origin given, and the grid's y axis points
+// `orientation` clockwise from projection north; without a projection
+// coordinates pass unchanged and the orientation is 0.
+TEST(MapFrame, ModelCoordinatesTurnWithTheGrid) {
+    const struct {
+        const char* projection;
+        double lon, lat, orientation, turn, east0;
+        const char* name;
+    } cases[] = {
+        {"UTM-32", 9.0, 54.25, 30.0, 30.0, 500000.0, "WGS 84 / UTM zone 32N"},
+        {"NON-UTM", 1000.0, 2000.0, 45.0, 0.0, 1000.0, "NON-UTM"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.projection);
+        GeoHandle frame = 0;
+        ASSERT_EQ(GeoOpen(&frame, c.projection, c.lon, c.lat, c.orientation), 0);
+        double lon = 0, lat = 0, e0 = 0, n0 = 0, e = 0, n = 0, x = 0, y = 0, north = 0;
+        GeoXy2Geo(frame, 0.0, 0.0, lon, lat);
+        EXPECT_NEAR(lon, c.lon, 1e-12);
+        EXPECT_NEAR(lat, c.lat, 1e-12);
+        GeoXy2Proj(frame, 0.0, 0.0, e0, n0);
+        EXPECT_NEAR(e0, c.east0, 1e-6);  // on the central meridian of its zone
+        GeoXy2Proj(frame, 0.0, 100.0, e, n);
+        EXPECT_NEAR(e - e0, 100.0 * std::sin(c.turn * M_PI / 180), 1e-9);
+        EXPECT_NEAR(n - n0, 100.0 * std::cos(c.turn * M_PI / 180), 1e-9);
+        GeoXy2Proj(frame, 100.0, 0.0, e, n);
+        EXPECT_NEAR(e - e0, 100.0 * std::cos(c.turn * M_PI / 180), 1e-9);
+        EXPECT_NEAR(n - n0, -100.0 * std::sin(c.turn * M_PI / 180), 1e-9);
+        GeoGeo2Xy(frame, c.lon + 0.1, c.lat + 0.05, x, y);
+        GeoXy2Geo(frame, x, y, lon, lat);
+        EXPECT_NEAR(lon, c.lon + 0.1, 1e-10);
+        EXPECT_NEAR(lat, c.lat + 0.05, 1e-10);
+        GeoProjectionNorth(frame, north);
+        EXPECT_EQ(north, -c.turn);
+        std::string name;
+        GeoProjectionName(frame, name);
+        EXPECT_EQ(name, c.name);
         GeoClose(frame);
     }
 }
 
-TEST(MapFrame, NoProjectionPassesCoordinatesAndTextsAreChecked) {
+// Texts that name no map projection are refused, a handle that is no frame
+// too. A short name is "UTM-<zone>" for a northern UTM zone on WGS 84, else
+// the EPSG code the CRS has or is identical to. Two texts are compared as
+// CRSs, blanks and a terminating zero aside.
+TEST(MapFrame, RefusedTextsAndHandlesAndComparedTexts) {
     GeoHandle frame = 0;
-    ASSERT_EQ(GeoOpen(&frame, "NON-UTM", 1000.0, 2000.0, 45.0), 0);
-    double e = 0, n = 0, x = 0, y = 0, north = 0;
-    GeoGeo2Proj(frame, 12.0, 34.0, e, n);
-    EXPECT_EQ(e, 12.0);
-    EXPECT_EQ(n, 34.0);
-    GeoGeo2Xy(frame, 1010.0, 2020.0, x, y);  // orientation is 0 without a projection
-    EXPECT_EQ(x, 10.0);
-    EXPECT_EQ(y, 20.0);
-    GeoProjectionNorth(frame, north);
-    EXPECT_EQ(north, 0.0);
+    // A grid in metres can't lie on longitude and latitude under a CRS's name.
+    for (const char* text : {"UTM-61", "no such thing", "EPSG:4326", "+proj=longlat +datum=WGS84"})
+        EXPECT_EQ(GeoOpen(&frame, text, 0, 0, 0), kGeoErrProjection) << text;
+    double lon = 0, lat = 0;
+    EXPECT_EQ(GeoProjectionOrigin("EPSG:4326", lon, lat), kGeoErrProjection);
+    // A Lambert conic's origin is its false origin.
+    ASSERT_EQ(GeoProjectionOrigin("EPSG:3034", lon, lat), 0);
+    EXPECT_TRUE(lon == 10.0 && lat == 52.0) << lon << " " << lat;
+    EXPECT_EQ(GeoXy2Geo(12345, 0, 0, lon, lat), kGeoErrHandle);
     std::string wkt;
+    ASSERT_EQ(GeoOpen(&frame, "NON-UTM", 0, 0, 0), 0);
     GeoCrsWkt(frame, wkt);
     EXPECT_EQ(wkt, "");
     GeoClose(frame);
 
-    EXPECT_EQ(GeoOpen(&frame, "UTM-61", 0, 0, 0), kGeoErrProjection);
-    EXPECT_EQ(GeoOpen(&frame, "no such thing", 0, 0, 0), kGeoErrProjection);
-    // A grid in metres can't lie on longitude and latitude under a CRS's name.
-    EXPECT_EQ(GeoOpen(&frame, "EPSG:4326", 0, 0, 0), kGeoErrProjection);
-    EXPECT_EQ(GeoOpen(&frame, "+proj=longlat +datum=WGS84", 0, 0, 0), kGeoErrProjection);
-    EXPECT_EQ(GeoXy2Geo(12345, 0, 0, e, n), kGeoErrHandle);
-
-    ASSERT_EQ(GeoOpen(&frame, "UTM-32", 9.0, 54.0, 0.0), 0);
-    GeoCrsWkt(frame, wkt);
-    EXPECT_NE(wkt.find("UTM zone 32N"), std::string::npos);
-    std::string name;
-    GeoProjectionName(frame, name);
-    EXPECT_EQ(name, "WGS 84 / UTM zone 32N");
-    GeoClose(frame);
-}
-
-// The calls on a projection text alone: its origin, its short name, and
-// whether two texts name one CRS.
-TEST(MapFrame, ProjectionTextsAreComparedAndNamed) {
-    const struct {
-        const char* projection;
-        double lon, lat;
-        const char* shortName;
-    } cases[] = {
-        {"UTM-32", 9.0, 0.0, "UTM-32"},
-        {"+proj=utm +zone=31 +datum=WGS84", 3.0, 0.0, "UTM-31"},
-        {"EPSG:28992", 5.38763888888889, 52.1561605555556, "EPSG:28992"},  // oblique stereographic
-        {"EPSG:3034", 10.0, 52.0, "EPSG:3034"},                            // Lambert, false origin
-        {"EPSG:25832+5783", 9.0, 0.0, "EPSG:5555"},                        // the code of this pair
-        {"NON-UTM", 0.0, 0.0, "NON-UTM"},
+    const std::pair<const char*, const char*> names[] = {
+        {"UTM-32", "UTM-32"},
+        {"+proj=utm +zone=31 +datum=WGS84", "UTM-31"},
+        {"+proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84", "UTM-31"},
+        {"EPSG:28992", "EPSG:28992"},
+        {"EPSG:3034", "EPSG:3034"},
+        {"EPSG:25832+5783", "EPSG:5555"},  // with a height: the code of the pair
+        {"long/lat", "LONG/LAT"},
     };
-    for (const auto& c : cases) {
-        double lon = -1, lat = -1;
-        ASSERT_EQ(GeoProjectionOrigin(c.projection, lon, lat), 0) << c.projection;
-        EXPECT_NEAR(lon, c.lon, 1e-9) << c.projection;
-        EXPECT_NEAR(lat, c.lat, 1e-9) << c.projection;
+    for (const auto& [text, expected] : names) {
         std::string name;
-        ASSERT_EQ(GeoShortName(c.projection, name), 0) << c.projection;
-        EXPECT_EQ(name, c.shortName);
+        EXPECT_EQ(GeoShortName(text, name), 0) << text;
+        EXPECT_EQ(name, expected) << text;
     }
-    double lon = 0, lat = 0;
-    EXPECT_EQ(GeoProjectionOrigin("EPSG:4326", lon, lat), kGeoErrProjection);
-
-    bool same = false;
-    EXPECT_EQ(GeoIdentical("UTM-32", "EPSG:32632", same), 0);
-    EXPECT_TRUE(same);
-    GeoIdentical("UTM-32", "+proj=utm +zone=32 +datum=WGS84", same);
-    EXPECT_TRUE(same);
-    GeoIdentical("UTM-32  ", "UTM-33", same);
-    EXPECT_FALSE(same);
-    // Fixed-width fields: the text ends at its last non-blank or at a zero.
-    GeoIdentical(std::string("long/lat\0junk", 13), "LONG/LAT    ", same);
-    EXPECT_TRUE(same);
+    const struct {
+        std::string a, b;
+        bool same;
+    } pairs[] = {
+        {"UTM-32", "EPSG:32632", true},
+        {"UTM-32", "+proj=utm +zone=32 +datum=WGS84", true},
+        {"UTM-32  ", "UTM-33", false},
+        {std::string("long/lat\0junk", 13), "LONG/LAT    ", true},  // fixed-width fields
+        {"NON-UTM", "LONG/LAT", false},
+    };
+    for (const auto& p : pairs) {
+        bool same = !p.same;
+        EXPECT_EQ(GeoIdentical(p.a, p.b, same), 0) << p.a;
+        EXPECT_EQ(same, p.same) << p.a << " and " << p.b;
+    }
+    bool same = true;
     EXPECT_EQ(GeoIdentical("UTM-32", "no such thing", same), kGeoErrProjection);
 }
 

@@ -131,6 +131,14 @@ int MakeProjection(Frame& f, const std::string& text) {
     f.crs = CreateCrs(text);
     if (f.crs == nullptr) return kGeoErrProjection;
     PJ* h = Horizontal(f.crs);
+    // Easting first, whatever order the CRS's definition gives its axes: the
+    // factors of the projection read the point and give the meridian
+    // convergence in that order (a northing-first CRS would otherwise turn
+    // true north by the better part of a right angle).
+    if (PJ* ordered = proj_normalize_for_visualization(Context(), h)) {
+        proj_destroy(h);
+        h = ordered;
+    }
     f.horizontal = h;
     const PJ_TYPE type = proj_get_type(h);
     if (type == PJ_TYPE_GEOGRAPHIC_2D_CRS || type == PJ_TYPE_GEOGRAPHIC_3D_CRS)
@@ -362,17 +370,22 @@ int GeoShortName(const std::string& projection, std::string& name) {
     if (crs == nullptr) return kGeoErrProjection;
     // The authority code the CRS carries, or the one PROJ finds it identical to.
     std::string authority, code;
-    if (const char* a = proj_get_id_auth_name(crs, 0)) {
+    auto take = [&](const PJ* object) {
+        const char* a = proj_get_id_auth_name(object, 0);
+        const char* c = proj_get_id_code(object, 0);
+        if (a == nullptr || c == nullptr) return false;
         authority = a;
-        code = proj_get_id_code(crs, 0);
-    } else {
+        code = c;
+        return true;
+    };
+    if (!take(crs)) {
         int* confidence = nullptr;
         PJ_OBJ_LIST* found = proj_identify(Context(), crs, "EPSG", nullptr, &confidence);
         // 70: equivalent under another name, such as any CRS made from a PROJ string.
         if (found != nullptr && proj_list_get_count(found) > 0 && confidence[0] >= 70) {
+            // A match may carry no code (a CRS with a datum shift to WGS 84).
             PJ* match = proj_list_get(Context(), found, 0);
-            authority = proj_get_id_auth_name(match, 0);
-            code = proj_get_id_code(match, 0);
+            take(match);
             proj_destroy(match);
         }
         proj_int_list_destroy(confidence);

@@ -42,6 +42,10 @@ Points Cs2cs(const std::string& crsPair, const Points& in) {
 // takes the projection's own). Then the WKT a data file gets (of a CRS, never
 // of a bare conversion) and the projection's own origin (natural origin,
 // false origin or centre).
+constexpr const char* kLcc =
+    "+proj=lcc +lat_0=52 +lon_0=10 +lat_1=35 +lat_2=65 +x_0=4000000 +y_0=2800000 +ellps=GRS80 "
+    "+type=crs";
+
 TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
     const struct {
         const char* projection;
@@ -69,6 +73,9 @@ TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
          10.0, 56.0, 5.0, "BOUNDCRS", 9.0, 0.0},
         {"+proj=tmerc +lon_0=3 +k=0.9996 +x_0=500000 +datum=WGS84", "EPSG:32631", "EPSG:32631",
          "EPSG:4326", true, 7.0, 51.0, 0.0, "PROJCRS", 3.0, 0.0},  // zone 31, unnamed
+        // A CRS whose definition gives the northing first (Lambert conic of
+        // Europe); cs2cs gets the same projection easting first.
+        {"EPSG:3034", kLcc, kLcc, "EPSG:4258", true, 12.0, 52.0, 0.0, "PROJCRS", 10.0, 52.0},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.projection);
@@ -181,6 +188,9 @@ TEST(MapFrame, RefusedTextsAndHandlesAndComparedTexts) {
         {"EPSG:3034", "EPSG:3034"},
         {"EPSG:25832+5783", "EPSG:5555"},  // with a height: the code of the pair
         {"long/lat", "LONG/LAT"},
+        // Like ED50 / UTM 32 but with its own datum shift: a CRS without a code.
+        {"+proj=utm +zone=32 +ellps=intl +towgs84=-87,-98,-121",
+         "+proj=utm +zone=32 +ellps=intl +towgs84=-87,-98,-121"},
     };
     for (const auto& [text, expected] : names) {
         std::string name;

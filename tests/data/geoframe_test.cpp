@@ -11,30 +11,31 @@ namespace {
 
 constexpr GeoHandle kNoFrame = 424242;
 
-// Every guarded call stops the run with its own name when the library fails
-// and no status is given; with a status it hands the code over and goes on.
+// Every guarded call hands a failure's code over when given a status and
+// goes on; without one it stops the run naming itself.
 TEST(GuardedMapFrame, EachCallStopsWithItsOwnName) {
     double a = 0, b = 0;
     std::string text;
+#define BW_CALL(f, ...)                        \
+    {                                          \
+#f, [&](int* s) { f(__VA_ARGS__, s); } \
+    }
     const std::vector<std::pair<std::string, std::function<void(int*)>>> calls = {
-        {"GeoFrameGetOrigin", [&](int* s) { GeoFrameGetOrigin("EPSG:4326", a, b, s); }},
-        {"GeoFrameGeo2Proj", [&](int* s) { GeoFrameGeo2Proj(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameProj2Geo", [&](int* s) { GeoFrameProj2Geo(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameXy2Geo", [&](int* s) { GeoFrameXy2Geo(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameGeo2xy", [&](int* s) { GeoFrameGeo2xy(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameXy2Proj", [&](int* s) { GeoFrameXy2Proj(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameProj2xy", [&](int* s) { GeoFrameProj2xy(kNoFrame, 0, 0, a, b, s); }},
-        {"GeoFrameGetProjectionName",
-         [&](int* s) { GeoFrameGetProjectionName(kNoFrame, text, s); }},
-        {"GeoFrameGetProjectionString",
-         [&](int* s) { GeoFrameGetProjectionString(kNoFrame, text, s); }},
-        {"GeoFrameGetTrueNorth", [&](int* s) { GeoFrameGetTrueNorth(kNoFrame, 0, 0, a, s); }},
-        {"GeoFrameGetProjectionNorth", [&](int* s) { GeoFrameGetProjectionNorth(kNoFrame, a, s); }},
-        {"GeoFrameProjectionShortName",
-         [&](int* s) { GeoFrameProjectionShortName("no such thing", text, s); }},
-        {"GeoFrameAreProjectionsIdentical",
-         [&](int* s) { GeoFrameAreProjectionsIdentical("UTM-32", "no such thing", s); }},
+        BW_CALL(GeoFrameGetOrigin, "EPSG:4326", a, b),
+        BW_CALL(GeoFrameGeo2Proj, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameProj2Geo, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameXy2Geo, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameGeo2xy, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameXy2Proj, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameProj2xy, kNoFrame, 0, 0, a, b),
+        BW_CALL(GeoFrameGetProjectionName, kNoFrame, text),
+        BW_CALL(GeoFrameGetProjectionString, kNoFrame, text),
+        BW_CALL(GeoFrameGetTrueNorth, kNoFrame, 0, 0, a),
+        BW_CALL(GeoFrameGetProjectionNorth, kNoFrame, a),
+        BW_CALL(GeoFrameProjectionShortName, "no such thing", text),
+        BW_CALL(GeoFrameAreProjectionsIdentical, "UTM-32", "no such thing"),
     };
+#undef BW_CALL
     for (const auto& [name, call] : calls) {
         int status = 0;
         call(&status);
@@ -46,9 +47,9 @@ TEST(GuardedMapFrame, EachCallStopsWithItsOwnName) {
     unsetenv("TRF");
 }
 
-// A point of the mesh side given in projected coordinates: the projection's
-// own origin opens a frame, and the point comes back in longitude, latitude
-// and the orientation of true north there.
+// A frame at the projection's origin: the origin maps to the false easting;
+// east of the central meridian true north lies slightly west of grid north;
+// the frame's projection text opens a frame again and matches its EPSG code.
 TEST(GuardedMapFrame, APointOnTheMapFromTheProjectionsOrigin) {
     double lon = 0, lat = 0;
     GeoFrameGetOrigin("UTM-31", lon, lat);
@@ -56,13 +57,12 @@ TEST(GuardedMapFrame, APointOnTheMapFromTheProjectionsOrigin) {
     GeoFrameOpen(frame, "UTM-31", lon, lat, 0.0);
     double east = 0, north = 0;
     GeoFrameGeo2Proj(frame, lon, lat, east, north);
-    EXPECT_NEAR(east, 500000.0, 1e-6);  // the central meridian on the equator
+    EXPECT_NEAR(east, 500000.0, 1e-6);
     EXPECT_NEAR(north, 0.0, 1e-6);
     double plon = 0, plat = 0, x = 0, y = 0, degrees = 0;
     GeoFrameProj2Geo(frame, 600000.0, 5800000.0, plon, plat);
     GeoFrameProj2xy(frame, 600000.0, 5800000.0, x, y);
     GeoFrameGetTrueNorth(frame, x, y, degrees);
-    // East of the central meridian true north lies west of grid north.
     EXPECT_GT(plon, 3.0);
     EXPECT_LT(degrees, 0.0);
     EXPECT_GT(degrees, -2.0);
@@ -70,7 +70,7 @@ TEST(GuardedMapFrame, APointOnTheMapFromTheProjectionsOrigin) {
     GeoFrameGetProjectionString(frame, text);
     int status = -1;
     GeoHandle again = 0;
-    GeoFrameOpen(again, text, plon, plat, degrees, &status);  // the string opens a frame again
+    GeoFrameOpen(again, text, plon, plat, degrees, &status);
     EXPECT_EQ(status, 0);
     EXPECT_TRUE(GeoFrameAreProjectionsIdentical(text, "EPSG:32631"));
     GeoClose(again);

@@ -23,17 +23,10 @@ protected:
     }
 };
 
-TEST_F(SeriesStore, NoSeriesOpensNothing) {
-    TsInit(10);
-    TsReadStep(1);
-    EXPECT_EQ(gTs.tsFileA, nullptr);
-    EXPECT_EQ(gTs.tsPosition, -1);
-    EXPECT_EQ(TsValue(0), kTsNoValue);
-    EXPECT_EQ(TsValue(1), kTsNoValue);
-}
-
+// Whichever scratch file ends up with the store, each step's row comes back;
+// no series opens nothing; ids outside the store give no value.
 TEST_F(SeriesStore, RowsComeBackStepByStepWhereverTheStoreEnded) {
-    for (int count : {1, 2, 3, 4}) {
+    for (int count : {0, 1, 2, 3, 4}) {
         TsReset();
         TsInit(6);
         std::vector<int32_t> ids(count);
@@ -41,6 +34,7 @@ TEST_F(SeriesStore, RowsComeBackStepByStepWhereverTheStoreEnded) {
         for (int n = 0; n < count; ++n) EXPECT_EQ(ids[n], n + 1);
         FILE* a = gTs.tsFileA;
         FILE* b = gTs.tsFileB;
+        EXPECT_EQ(a == nullptr, count == 0);
         TsReadStep(1);  // passes over the row of step 0
         // After an odd number of series the store is in the first file, else in the second.
         EXPECT_EQ(gTs.tsFile, count % 2 == 1 ? a : b) << count;
@@ -49,11 +43,14 @@ TEST_F(SeriesStore, RowsComeBackStepByStepWhereverTheStoreEnded) {
             for (int n = 0; n < count; ++n)
                 EXPECT_EQ(TsValue(ids[n]), 100.0f * (n + 1) + step) << count << " " << step;
         }
+        EXPECT_EQ(gTs.tsPosition, count == 0 ? -1 : 5);
         EXPECT_EQ(TsValue(0), kTsNoValue);
         EXPECT_EQ(TsValue(count + 1), kTsNoValue);
     }
 }
 
+// Reading may start at any step, then goes forward one step at a time; no
+// series is added once reading started; there is no row behind the last.
 TEST_F(SeriesStore, ReadingStartsAtAnyStepAndOnlyGoesForward) {
     TsInit(5);
     int32_t id = 0;
@@ -67,14 +64,12 @@ TEST_F(SeriesStore, ReadingStartsAtAnyStepAndOnlyGoesForward) {
                 "tsfunc: Reading has already started");
     TsReadStep(4);
     EXPECT_EQ(TsValue(id), 4.5f);
-    // Step 4 was the last of five rows: there is nothing behind it.
     EXPECT_EXIT(TsReadStep(5), testing::ExitedWithCode(1), "tsfunc: Unable to read scratch file");
     unsetenv("TRF");
 }
 
-// The scratch files lie in the system's temporary folder but leave no name
-// there, not even while the store is in use: nothing remains however the
-// process ends.
+// The scratch files lie in the temporary folder but leave no name there, not
+// even while in use, so nothing remains however the process ends.
 TEST_F(SeriesStore, ScratchFilesLeaveNothingInTheTemporaryFolder) {
     bwtest::TempDir tmp;
     const char* old = std::getenv("TMPDIR");
@@ -94,10 +89,7 @@ TEST_F(SeriesStore, ScratchFilesLeaveNothingInTheTemporaryFolder) {
     }
     for (int step = 1; step < 1000; ++step) TsReadStep(step);
     EXPECT_EQ(TsValue(ids[2]), 20.0f + 999.0f);
-    if (old)
-        setenv("TMPDIR", saved.c_str(), 1);
-    else
-        unsetenv("TMPDIR");
+    old ? setenv("TMPDIR", saved.c_str(), 1) : unsetenv("TMPDIR");
 }
 
 }  // namespace

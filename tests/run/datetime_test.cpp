@@ -4,6 +4,8 @@
 
 namespace {
 
+// Day numbers count from 1970-01-01, keep the Gregorian leap rules and turn
+// back into the same calendar date over eight centuries.
 TEST(Dates, DayNumbersRoundTripAcrossCenturiesAndLeapDays) {
     EXPECT_EQ(DayNumber(1970, 1, 1), 0);
     EXPECT_EQ(DayNumber(2000, 3, 1) - DayNumber(2000, 2, 28), 2);  // 2000 is a leap year
@@ -15,23 +17,21 @@ TEST(Dates, DayNumbersRoundTripAcrossCenturiesAndLeapDays) {
     }
 }
 
-TEST(Dates, SecondsRollTheDayBothWays) {
-    DateTime t = MakeDateTime(2004, 12, 31, 23, 59, 30.0);
+// Seconds and minutes that run over roll the day and the year, both ways;
+// the text of a date comes back from parsing, and impossible dates are refused.
+TEST(Dates, RollOverAndParsing) {
+    const DateTime t = MakeDateTime(2004, 12, 31, 23, 59, 30.0);
     EXPECT_EQ(DateTimeText(AddSeconds(t, 45.0)), "2005-01-01 00:00:15");
     EXPECT_EQ(DateTimeText(AddSeconds(t, -86400.0 * 366)), "2003-12-31 23:59:30");
     EXPECT_EQ(DateTimeText(MakeDateTime(2004, 1, 1, 0, 90, 0)), "2004-01-01 01:30:00");
-}
-
-TEST(Dates, ParsingAcceptsOnlyRealDates) {
-    DateTime t;
-    ASSERT_TRUE(ParseDateTime("2024-02-29 12:00:01", t));
-    EXPECT_EQ(DateTimeText(t), "2024-02-29 12:00:01");
-    ASSERT_TRUE(ParseDateTime("2024-03-01", t));
-    EXPECT_EQ(t.seconds, 0.0);
-    EXPECT_FALSE(ParseDateTime("2023-02-29 00:00:00", t));
-    EXPECT_FALSE(ParseDateTime("2023-13-01 00:00:00", t));
-    EXPECT_FALSE(ParseDateTime("2023-01-01 24:00:00", t));
-    EXPECT_FALSE(ParseDateTime("yesterday", t));
+    DateTime p;
+    ASSERT_TRUE(ParseDateTime("2024-02-29 12:00:01", p));
+    EXPECT_EQ(DateTimeText(p), "2024-02-29 12:00:01");
+    ASSERT_TRUE(ParseDateTime("2024-03-01", p));
+    EXPECT_EQ(p.seconds, 0.0);
+    for (const char* bad :
+         {"2023-02-29 00:00:00", "2023-13-01 00:00:00", "2023-01-01 24:00:00", "yesterday"})
+        EXPECT_FALSE(ParseDateTime(bad, p)) << bad;
 }
 
 }  // namespace

@@ -3,74 +3,54 @@
 #include <gtest/gtest.h>
 
 #include "run/process.hpp"
-
-namespace {
-
-std::string Parse(std::vector<const char*> args, int& level) {
-    args.insert(args.begin(), "bw");
-    level = 0;
-    return ParseArguments(static_cast<int>(args.size()), args.data(), level);
-}
-
-TEST(CommandLine, OptionsAndTheFileName) {
-    int level = 0;
-    EXPECT_EQ(Parse({"model.bw"}, level), "model.bw");
-    EXPECT_EQ(level, 0);
-    EXPECT_EQ(Parse({"-debug:3", "model.bw"}, level), "model.bw");
-    EXPECT_EQ(level, 3);
-    EXPECT_EQ(Parse({"-debug:x", "model.bw"}, level), "model.bw");
-    EXPECT_EQ(level, 1);  // not a number: the level of -debug stays
-    EXPECT_EQ(Parse({"//hud", "-debug", "a.bw", "b.bw"}, level), "b.bw");  // a later name wins
-    EXPECT_EQ(level, 1);
-    // An option blanks the name read before it.
-    EXPECT_EQ(Parse({"model.bw", "-debug"}, level), "");
-    EXPECT_EQ(Parse({"-debug"}, level), "");
-    EXPECT_EQ(Parse({}, level), "");
-}
-
-TEST(CommandLine, ChannelNameDropsTheLaterModelExtension) {
-    EXPECT_EQ(ChannelName("runs/harbour.bw"), "runs/harbour");
-    EXPECT_EQ(ChannelName("HARBOUR.BW"), "HARBOUR");
-    EXPECT_EQ(ChannelName("a.BW.copy.bw"), "a.BW.copy");
-    EXPECT_EQ(ChannelName("  model.kvt  "), "model.kvt");
-}
-
-TEST(ProcessLayer, ThreadsAreClippedToWhatTheMachineHas) {
-    gProcess.processorCount = 4;
-    gProcess.maxThreads = 3;
-    SetThreads(8);
-    EXPECT_EQ(gProcess.threadCount, 3);
-    SetThreads(0);
-    EXPECT_EQ(gProcess.threadCount, 3);
-    SetThreads(-1);
-    EXPECT_EQ(gProcess.threadCount, 3);
-    SetThreads(2);
-    EXPECT_EQ(gProcess.threadCount, 2);
-    SetThreads(-7);
-    EXPECT_EQ(gProcess.threadCount, 1);
-}
-
-TEST(ProcessLayer, FilesCarryTheProcessIdOnlyUnderALauncherWithMore) {
-    ProcessState saved = gProcess;
-    gProcess.processCount = 1;
-    gProcess.processId = -1;
-    EXPECT_EQ(ProcessFileStem("dir/model"), "dir/model");
-    gProcess.processCount = 2;
-    gProcess.processId = 1;
-    EXPECT_EQ(ProcessFileStem("dir/model"), "dir/model_p1");
-    gProcess.processCount = saved.processCount;
-    gProcess.processId = saved.processId;
-}
-
-}  // namespace
-
 #include "support/log_capture.hpp"
 
 namespace {
 
-TEST(ProcessLayer, EnvironmentBlockNamesEveryMachineOnProcessZero) {
+// The parameter file is the last name on the command line; an option blanks
+// a name read before it; -debug:N sets the level, -debug alone sets 1.
+TEST(CommandLine, OptionsAndTheFileName) {
+    const struct {
+        std::vector<const char*> args;
+        const char* name;
+        int level;
+    } cases[] = {
+        {{"model.bw"}, "model.bw", 0},
+        {{"-debug:3", "model.bw"}, "model.bw", 3},
+        {{"-debug:x", "model.bw"}, "model.bw", 1},  // not a number: the level of -debug stays
+        {{"//hud", "-debug", "a.bw", "b.bw"}, "b.bw", 1},
+        {{"model.bw", "-debug"}, "", 1},
+    };
+    for (const auto& c : cases) {
+        std::vector<const char*> argv = {"bw"};
+        argv.insert(argv.end(), c.args.begin(), c.args.end());
+        int level = 0;
+        EXPECT_EQ(ParseArguments(static_cast<int>(argv.size()), argv.data(), level), c.name)
+            << argv.size();
+        EXPECT_EQ(level, c.level) << argv.size();
+    }
+    EXPECT_EQ(ChannelName("runs/harbour.bw"), "runs/harbour");
+    EXPECT_EQ(ChannelName("HARBOUR.BW"), "HARBOUR");
+    EXPECT_EQ(ChannelName("a.BW.copy.bw"), "a.BW.copy");  // only the later extension goes
+    EXPECT_EQ(ChannelName("  model.kvt  "), "model.kvt");
+}
+
+// Threads: 0 or -1 ask for all, cut to the runtime's maximum, at least one.
+TEST(ProcessLayer, ThreadsAreClippedToWhatTheMachineHas) {
+    const ProcessState saved = gProcess;
+    gProcess.processorCount = 4;
+    gProcess.maxThreads = 3;
+    for (auto [wanted, used] : {std::pair{8, 3}, {0, 3}, {-1, 3}, {2, 2}, {-7, 1}}) {
+        SetThreads(wanted);
+        EXPECT_EQ(gProcess.threadCount, used) << wanted;
+    }
+    gProcess = saved;
+}
+
+// Process 0 names every machine and the number of its processes in the log.
+TEST(ProcessLayer, TheEnvironmentBlockNamesEveryMachine) {
+    const ProcessState saved = gProcess;
     bwtest::LogCapture log;
-    ProcessState saved = gProcess;
     gProcess.processorName = "node-a";
     gProcess.processCount = 4;
     gProcess.processId = 0;
@@ -78,15 +58,8 @@ TEST(ProcessLayer, EnvironmentBlockNamesEveryMachineOnProcessZero) {
     gProcess.machineNames = {"node-a", "node-b"};
     gProcess.machineProcesses = {3, 1};
     WriteComputingEnvironment();
-    gProcess.processCount = saved.processCount;
-    gProcess.processId = saved.processId;
-    gProcess.machineCount = saved.machineCount;
-    gProcess.machineNames = saved.machineNames;
-    gProcess.machineProcesses = saved.machineProcesses;
-    gProcess.processorName = saved.processorName;
+    gProcess = saved;
     const std::string text = log.Text();
-    EXPECT_NE(text.find("  Number of processes  : 4\n  Local process id     : 0\n"),
-              std::string::npos);
     EXPECT_NE(text.find("  Number of machines   : 2\n"
                         "  Machine            #1: node-a (3)\n"
                         "  Machine            #2: node-b (1)\n"),

@@ -2,6 +2,9 @@
 
 #include <omp.h>
 
+#include <cmath>
+#include <numbers>
+
 #include "data/tsfunc.hpp"
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
@@ -15,6 +18,8 @@
 #include "solver2d/time_loop.hpp"
 
 namespace bwtest {
+
+constexpr double kPi = std::numbers::pi;
 
 void MakeBasin(const BasinSpec& s) {
     ResetModelState();
@@ -108,8 +113,57 @@ double Project(const std::function<double(float, float)>& shape) {
 std::vector<double> ZeroCrossings(const std::vector<double>& v, double dt) {
     std::vector<double> t;
     for (size_t i = 1; i < v.size(); ++i)
-        if ((v[i - 1] < 0.0) != (v[i] < 0.0)) t.push_back(dt * ((i - 1) + v[i - 1] / (v[i - 1] - v[i])));
+        if ((v[i - 1] < 0.0) != (v[i] < 0.0))
+            t.push_back(dt * ((i - 1) + v[i - 1] / (v[i - 1] - v[i])));
     return t;
+}
+
+double Omega2(double k, double d, double B) {
+    const double kd = k * d;
+    return static_cast<double>(kGravity) * d * k * k * (1.0 + B * kd * kd) /
+           (1.0 + (B + 1.0 / 3.0) * kd * kd);
+}
+
+Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t waves,
+                    int32_t periods) {
+    const double B = deep ? static_cast<double>(1.0f / 15.0f) : 0.0, omega = 2.0 * kPi / T;
+    double lo = 1e-6, hi = 100.0;  // the wave number in 1 m of water, by bisection
+    for (int i = 0; i < 200; ++i)
+        (Omega2(0.5 * (lo + hi), 1.0, B) < omega * omega ? lo : hi) = 0.5 * (lo + hi);
+    Channel ch;
+    ch.k = 0.5 * (lo + hi), ch.c = omega / ch.k, ch.dt = T / 60.0, ch.J = 30 * waves,
+    ch.steps = 60 * periods;
+    BasinSpec s;
+    s.dx = s.dy = static_cast<float>(2.0 * kPi / ch.k / 30.0);
+    s.J = ch.J, s.K = 4, s.dt = ch.dt, s.steps = ch.steps, s.frameWest = false;
+    s.deepWater = deep, s.dispersionFactor = 1.0f / 15.0f;
+    MakeBasin(s);
+    ch.dx = s.dx;
+
+    BoundaryRecord r;
+    r.first[0] = 0, r.first[1] = 1, r.last[0] = 0, r.last[1] = s.K - 1;
+    r.orientation = 1;
+    r.formulation = formulation;
+    std::vector<float> series(s.steps + 1), across(s.steps + 1);
+    const double amplitude = formulation == 0 ? a : a * ch.c, ramp = 4.0 * T;
+    for (int32_t n = 0; n <= s.steps; ++n) {
+        const double t = n * s.dt, rise = t < ramp ? 0.5 * (1.0 - std::cos(kPi * t / ramp)) : 1.0;
+        series[n] = static_cast<float>(amplitude * rise * std::sin(omega * t));
+        across[n] = static_cast<float>(
+            formulation == 0 ? -ch.k * ch.k * a * rise * std::sin(omega * t)
+                             : -ch.k * a * rise * std::cos(omega * t - ch.k * 0.5 * s.dx));
+    }
+    TsAddSeries(r.seriesId, series.data());
+    if (deep) TsAddSeries(r.deepSeriesId, across.data());
+    gBoundaries.numberOfBoundaries = 1;
+    gBoundaries.records = {r};
+    BoundaryTable table;
+    table.rows = s.K - 1;
+    table.values.assign(6 * table.rows, 0.0f);
+    for (int32_t row = 0; row < table.rows; ++row)
+        table.Value(row, 2) = static_cast<float>(formulation);
+    gBoundaries.boundaryValues = {table};
+    return ch;
 }
 
 }  // namespace bwtest

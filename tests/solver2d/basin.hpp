@@ -10,17 +10,17 @@
 namespace bwtest {
 
 struct BasinSpec {
-    int32_t J = 20, K = 4;   // highest indices; j = 0, J and k = 0, K are land
+    int32_t J = 20, K = 4;  // highest indices; j = 0, J and k = 0, K are land
     float dx = 1.0f, dy = 1.0f;
     float depth = 1.0f;
     double dt = 0.1;
-    int32_t steps = 100;     // rows of the series store
+    int32_t steps = 100;  // rows of the series store
     bool deepWater = false;
     float dispersionFactor = 0.0f;
     int32_t convectiveHandle = 0;
     int32_t threads = 1;
     float extrapolation = 0.0f;  // Time_extrapolation_factor_lower with the deep-water terms
-    bool frameWest = true;   // land at j = 0 (the east, south and north frames are always land)
+    bool frameWest = true;       // land at j = 0 (the east, south and north frames are always land)
 };
 
 // Resets the model state and builds the basin; bed of water points is -depth.
@@ -36,5 +36,24 @@ double TotalVolume();
 double Project(const std::function<double(float x, float y)>& shape);
 // Times of the zero crossings of a sampled signal (linear interpolation).
 std::vector<double> ZeroCrossings(const std::vector<double>& values, double dt);
+
+// w^2 of the wave number k in depth d by the linear dispersion relation of
+// the equations solved, B the dispersion factor (0 without the deep-water terms):
+//   w^2 = g d k^2 (1 + B (kd)^2) / (1 + (B + 1/3) (kd)^2).
+double Omega2(double k, double d, double B);
+
+// A channel along x in 1 m of water, K = 4, `waves` wavelengths long at 30
+// cells a wavelength and run for `periods` periods at 60 steps a period. Its
+// west end (j = 0) is an open boundary of the formulation (0 level, 1 flux)
+// driven by a sine of period T and amplitude a (a flux carries a*c*d) after
+// a cosine ramp of four periods. With the deep-water terms the boundary also
+// gives the curvature of the surface across a level boundary, the slope
+// across a flux boundary.
+struct Channel {
+    double k = 0.0, c = 0.0, dx = 0.0, dt = 0.0;
+    int32_t J = 0, steps = 0;
+};
+Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t waves,
+                    int32_t periods);
 
 }  // namespace bwtest

@@ -69,72 +69,61 @@ protected:
     int32_t Number(int32_t j, int32_t k) { return gGeneration.sourceIndex[gGrid.At(j, k)]; }
 };
 
-TEST_F(Generation, ALineAlongKNumbersItsPointsAndTheirEastNeighbours) {
-    Setup({{10, 5, 10, 20, 16}});
-    const InternalGenRecord& r = gGeneration.records[0];
-    EXPECT_EQ(r.pointCount, 15);
-    EXPECT_EQ(LineKind(r), 1);
-    EXPECT_EQ(gGeneration.sourceCount, 32);
-    for (int32_t k = 5; k <= 20; ++k) {
-        EXPECT_EQ(Number(10, k), 2 * (k - 5) + 1);
-        EXPECT_EQ(Number(11, k), 2 * (k - 5) + 2);
+TEST_F(Generation, EveryKindOfLineNumbersItsPointsAndNeighboursAndReadsItsFile) {
+    // Along k with its ends given high first (feeds x: the east neighbour),
+    // along j (feeds y: the north neighbour), a single point (both
+    // neighbours) and an oblique line (no neighbour, rounded onto the grid).
+    // Their files hold records every 2 s from 3 s before the start.
+    const std::vector<Line> lines = {{10, 20, 10, 5, 16}, {3, 2, 6, 2, 4}, {5, 5, 5, 5, 1},
+                                     {15, 5, 25, 10, 11}};
+    Setup(lines, "2003-12-31 23:59:57", 2.0, 10);
+    const auto& r = gGeneration.records;
+    const int kinds[4] = {1, 2, 1, 3}, counts[4] = {15, 3, 0, 10};
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_EQ(LineKind(r[i]), kinds[i]) << i;
+        EXPECT_EQ(r[i].pointCount, counts[i]) << i;
     }
-    EXPECT_EQ(Number(10, 4), 0);
-    EXPECT_EQ(Number(10, 21), 0);
-    EXPECT_EQ(Number(9, 10), 0);
-    EXPECT_EQ(gGeneration.sourceP.size(), 33u);  // numbers 1..32, element 0 unused
-    EXPECT_TRUE(gGeneration.sourceXiX.empty());  // no deep-water terms
-    EXPECT_EQ(gGeneration.genJ2, 30);
-    EXPECT_EQ(gGeneration.genK2, 25);
-}
-
-TEST_F(Generation, EndsGivenHighFirstRunDownAndLinesAlongJFeedY) {
-    Setup({{10, 20, 10, 5, 16}, {3, 2, 6, 2, 4}});
-    EXPECT_EQ(gGeneration.records[0].pointK[0], 20);
-    EXPECT_EQ(gGeneration.records[0].pointK[15], 5);
-    EXPECT_EQ(Number(10, 20), 1);
-    EXPECT_EQ(Number(11, 5), 32);
-    // The second record goes on from 32, its neighbours one up in k.
-    EXPECT_EQ(LineKind(gGeneration.records[1]), 2);
-    EXPECT_EQ(Number(3, 2), 33);
-    EXPECT_EQ(Number(3, 3), 34);
-    EXPECT_EQ(Number(6, 3), 40);
-    EXPECT_EQ(gGeneration.sourceCount, 40);
-}
-
-TEST_F(Generation, ASinglePointHasThreeNumbersAndAnObliqueLineOneForEachPoint) {
-    Setup({{5, 5, 5, 5, 1}, {10, 5, 20, 10, 11}});
-    EXPECT_EQ(Number(5, 5), 1);
-    EXPECT_EQ(Number(6, 5), 2);
-    EXPECT_EQ(Number(5, 6), 3);
-    const InternalGenRecord& r = gGeneration.records[1];
-    EXPECT_EQ(LineKind(r), 3);
-    ASSERT_EQ(r.pointCount, 10);
+    for (int32_t k = 5; k <= 20; ++k) {  // record 1 runs from k = 20 down
+        EXPECT_EQ(Number(10, k), 2 * (20 - k) + 1) << k;
+        EXPECT_EQ(Number(11, k), 2 * (20 - k) + 2) << k;
+    }
+    for (int32_t j = 3; j <= 6; ++j) {  // record 2 goes on from 32
+        EXPECT_EQ(Number(j, 2), 33 + 2 * (j - 3)) << j;
+        EXPECT_EQ(Number(j, 3), 34 + 2 * (j - 3)) << j;
+    }
+    EXPECT_EQ(Number(5, 5), 41);
+    EXPECT_EQ(Number(6, 5), 42);
+    EXPECT_EQ(Number(5, 6), 43);
     const int expectedK[11] = {5, 6, 6, 7, 7, 8, 8, 9, 9, 10, 10};
     for (int s = 0; s <= 10; ++s) {
-        EXPECT_EQ(r.pointJ[s], 10 + s);
-        EXPECT_EQ(r.pointK[s], expectedK[s]) << s;
-        EXPECT_EQ(Number(10 + s, expectedK[s]), 4 + s);
+        EXPECT_EQ(r[3].pointJ[s], 15 + s);
+        EXPECT_EQ(r[3].pointK[s], expectedK[s]) << s;
+        EXPECT_EQ(Number(15 + s, expectedK[s]), 44 + s) << s;
     }
-    EXPECT_EQ(gGeneration.sourceCount, 14);
-}
+    // Beyond the ends, beside a line and beside a single point: no source.
+    for (auto [j, k] : {std::pair{10, 4}, {10, 21}, {9, 10}, {12, 10}, {7, 2}, {4, 5}, {16, 5}})
+        EXPECT_EQ(Number(j, k), 0) << j << "," << k;
+    EXPECT_EQ(gGeneration.sourceCount, 54);
+    EXPECT_EQ(gGeneration.sourceP.size(), 55u);  // element 0 unused
 
-TEST_F(Generation, ALineFileStartsWithTheRecordsAroundTheSimulationStart) {
-    // Records every 2 s from 3 s before the start: the older one stands
-    // 1 s before it, the newer 1 s after it.
-    Setup({{10, 5, 10, 8, 4}}, "2003-12-31 23:59:57", 2.0, 10);
-    const InternalLineFile& l = gGeneration.lineFiles[0];
-    EXPECT_DOUBLE_EQ(l.olderTime, -1.0);
-    EXPECT_DOUBLE_EQ(l.fileStep, 2.0);
-    EXPECT_EQ(l.older, std::vector<float>(4, 1.0f));
-    EXPECT_EQ(l.newer, std::vector<float>(4, 2.0f));
-    EXPECT_TRUE(l.deepOlder.empty());  // item 2 passed over without the deep-water terms
-
-    gEquation.deepWaterTerms = true;
-    TearDown();
-    Setup({{10, 5, 10, 8, 4}}, "2003-12-31 23:59:57", 2.0, 10);
-    EXPECT_EQ(gGeneration.lineFiles[0].deepNewer, std::vector<float>(4, 20.0f));
-    EXPECT_EQ(gGeneration.sourceXiY.size(), 9u);
+    // A line file starts with the records around the start: the older one
+    // 1 s before it, the newer 1 s after it. Item 2 is passed over without
+    // the deep-water terms and read with them.
+    for (bool deep : {false, true}) {
+        if (deep) {
+            TearDown();
+            gEquation.deepWaterTerms = true;
+            Setup(lines, "2003-12-31 23:59:57", 2.0);
+        }
+        const InternalLineFile& l = gGeneration.lineFiles[1];
+        EXPECT_DOUBLE_EQ(l.olderTime, -1.0);
+        EXPECT_DOUBLE_EQ(l.fileStep, 2.0);
+        EXPECT_EQ(l.older, std::vector<float>(4, 1.0f));
+        EXPECT_EQ(l.newer, std::vector<float>(4, 2.0f));
+        EXPECT_EQ(l.deepNewer, deep ? std::vector<float>(4, 20.0f) : std::vector<float>{});
+        EXPECT_EQ(gGeneration.sourceXiY.size(), deep ? 55u : 0u);
+    }
+    gEquation.deepWaterTerms = false;
 }
 
 TEST_F(Generation, AHotStartBringsBackTheSourcesOfItsItems15To18) {

@@ -86,43 +86,32 @@ protected:
     float At(const Field& f, int j, int k) { return f[gGrid.At(j, k)]; }
 };
 
-TEST_F(ModelReader, GridPeriodAndTheReferenceLevelShift) {
+TEST_F(ModelReader, ReferenceLevelShiftPeriodAndAColdStart) {
     Read({{"Area_Description", "True_land_value = 0.5\nReference_Level_Shift = 1\n"},
           {"Simulation_Period",
            "Time_step_count = 20\nTime_step_interval = 0.25\n"
-           "Warm_up_period = 4\nStart_time = 2004, 2, 29, 23, 59, 30\n"}});
+           "Warm_up_period = 4\nStart_time = 2004, 2, 29, 23, 59, 30\n"},
+          {"SURFACE_ELEVATION", "SURFACE_TYPE = 0\nConstant_Value = 0.5\n"}});
     const GridState& g = gGrid;
-    EXPECT_EQ(g.J, 6);
-    EXPECT_EQ(g.K, 4);
-    EXPECT_EQ(g.dx, 2.0f);
-    EXPECT_EQ(g.dy, 3.0f);
-    EXPECT_EQ(g.projection, "NON-UTM");
     // Water points are lowered by 1; land and the point at the land value are not.
     EXPECT_FLOAT_EQ(At(g.bed, 2, 1), -2.2f);
     EXPECT_EQ(At(g.bed, 2, 3), 1.0f);
     EXPECT_EQ(At(g.bed, 4, 2), 0.5f);
     EXPECT_EQ(g.waterPoints, 7 * 4 - 1);
-    EXPECT_EQ(g.timeStepCount, 20);
+    // The period reaches the grid, the progress channel and the series store.
     EXPECT_EQ(g.lastStep, 19);
-    EXPECT_EQ(g.dt, 0.25);
     EXPECT_EQ(g.warmUpPeriod, 4);
     EXPECT_EQ(DateTimeText(g.start), "2004-02-29 23:59:30");
     EXPECT_EQ(DateTimeText(gProgress.simulationStart), "2004-02-29 23:59:30");
     EXPECT_EQ(gProgress.timeStep, 0.25);
     EXPECT_EQ(gTs.tsSteps, 21);  // steps 0..20
-    // The state exists, the fluxes at their start value.
-    EXPECT_EQ(g.P.size(), g.Points());
-    EXPECT_EQ(At(g.P, 3, 2), 1e-10f);
-}
-
-TEST_F(ModelReader, TheSelectedItemOfTheBathymetryStays) {
-    WriteItems(dir / "three.xol2", spec, 4, -10.0f);
-    Read(
-        {{"Bathymetry_Selection",
-          "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"}});
-    EXPECT_EQ(At(gGrid.bed, 5, 2), -7.0f);
-    EXPECT_FALSE(gBathymetry.hotStart);
-    EXPECT_EQ(gBathymetry.itemNumbers[0], 3);
+    // The cold start puts its one level over water and land alike.
+    for (auto [j, k] : {std::pair{2, 1}, {2, 3}}) {
+        EXPECT_EQ(At(g.xi, j, k), 0.5f);
+        EXPECT_EQ(At(g.xiPrev, j, k), 0.5f);
+        EXPECT_EQ(At(g.xiPrev2, j, k), 0.5f);
+        EXPECT_FLOAT_EQ(At(g.depth, j, k), 0.5f - At(g.bed, j, k));
+    }
 }
 
 TEST_F(ModelReader, EquationSettingsAndTheirForcedValues) {
@@ -137,7 +126,6 @@ TEST_F(ModelReader, EquationSettingsAndTheirForcedValues) {
     EXPECT_EQ(gEquation.waterDepthLimit, 4.0f);
     const std::string log = Log();
     EXPECT_NE(log.find("    Dispersion_Factor : 5\n"), std::string::npos);  // as read
-    EXPECT_NE(log.find("    Time_extrapolation_factor_upper : 0 (default)\n"), std::string::npos);
 
     for (const char* edge : {"-0.333", "0.166"}) {
         ResetModelState();
@@ -150,17 +138,17 @@ TEST_F(ModelReader, EquationSettingsAndTheirForcedValues) {
     }
 }
 
-TEST_F(ModelReader, ProcessSettings) {
+TEST_F(ModelReader, ProcessSettingsOverTheSelectedItemOfTheBathymetry) {
     bwtest::WriteMapFile(dir / "por.xol2", spec, bwtest::Constant(spec, 0.5f));
-    Read({{"MOVING_SHORELINE", "type = 1\ndepth = -4\nwidth = 0.02\n"},
+    WriteItems(dir / "three.xol2", spec, 4, -10.0f);
+    Read({{"Bathymetry_Selection",
+           "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"},
+          {"MOVING_SHORELINE", "type = 1\ndepth = -12\nwidth = 0.02\n"},
           {"Bottom_Friction", "Resistance_Type = 1\nFormulation = 1\nConstant_Value = 40\n"},
           {"EDDY_VISCOSITY", "Type = 1\nFormulation = 0\nBase = 0\nConstant_Value = 0.3\n"},
           {"Porosity",
            "Porosity_Type = true\nParticle_Diameter = 0.1\n" + bwtest::DataFileSection("por.xol2")},
           {"OPTION_PARAMETERS", "Sponge_Reference_s = 1.5\nHUD_update_2DH = 7\n"}});
-    EXPECT_EQ(gShoreline.type, 1);
-    EXPECT_EQ(gShoreline.slotDepth, -4.0);
-    EXPECT_EQ(gShoreline.width, 0.02);
     EXPECT_EQ(gFriction.frictionConstant, 9.81f / 1600.0f);
     // Base 0: the field is there and the sweeps act as if it were off.
     EXPECT_EQ(gEddy.eddyType, -1);
@@ -169,21 +157,13 @@ TEST_F(ModelReader, ProcessSettings) {
     EXPECT_EQ(At(gPorosity.porosity, 3, 1), 0.5f);
     EXPECT_EQ(gOptions.spongeReferenceS, 1.5f);
     EXPECT_EQ(gProgress.updateInterval, 7);
-    // The slot reaches the initial depth: above the bed it adds its cross-section.
-    const double hs = -1.2 + 4.0;
+    // Item 3 of the bathymetry file is the bed, 7 m deep. The slot (its type,
+    // depth and width as read) reaches the initial depth: above the bed it
+    // adds its cross-section.
+    EXPECT_EQ(At(gGrid.bed, 5, 2), -7.0f);
+    const double hs = -7.0 + 12.0;
     const double slot = hs * ((1 - std::exp(-100.0)) * 0.98 / 100.0 + 0.02);
-    EXPECT_NEAR(At(gGrid.depth, 2, 1), 1.2 + slot, 1e-5);
-}
-
-TEST_F(ModelReader, AColdStartPutsOneLevelEverywhere) {
-    Read({{"SURFACE_ELEVATION", "SURFACE_TYPE = 0\nConstant_Value = 0.5\n"}});
-    const GridState& g = gGrid;
-    for (auto [j, k] : {std::pair{2, 1}, {2, 3}}) {  // water and land alike
-        EXPECT_EQ(At(g.xi, j, k), 0.5f);
-        EXPECT_EQ(At(g.xiPrev, j, k), 0.5f);
-        EXPECT_EQ(At(g.xiPrev2, j, k), 0.5f);
-        EXPECT_FLOAT_EQ(At(g.depth, j, k), 0.5f - At(g.bed, j, k));
-    }
+    EXPECT_NEAR(At(gGrid.depth, 2, 1), 7.0 + slot, 1e-5);
 }
 
 TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
@@ -192,13 +172,10 @@ TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
           {"SURFACE_ELEVATION", "-"}});
     const GridState& g = gGrid;
     EXPECT_EQ(g.bed, Bed());
-    EXPECT_EQ(At(g.xi, 1, 1), 103.0f);
-    EXPECT_EQ(At(g.P, 1, 1), 104.0f);
-    EXPECT_EQ(At(g.Q, 1, 1), 105.0f);
-    EXPECT_EQ(At(g.xiPrev, 1, 1), 106.0f);
-    EXPECT_EQ(At(g.QPrev, 1, 1), 108.0f);
-    EXPECT_EQ(At(g.qxyt, 1, 1), 110.0f);
-    EXPECT_EQ(At(g.xiPrev2, 1, 1), 1e-10f);  // not in the file
+    // Items 3 to 10 in file order; xiPrev2 is not in the file.
+    for (auto [f, v] : {std::pair{&g.xi, 103.0f}, {&g.P, 104.0f}, {&g.Q, 105.0f}, {&g.xiPrev, 106.0f},
+                        {&g.QPrev, 108.0f}, {&g.qxyt, 110.0f}, {&g.xiPrev2, 1e-10f}})
+        EXPECT_EQ(At(*f, 1, 1), v) << v;
     EXPECT_FLOAT_EQ(At(g.depth, 1, 1), 103.0f + 1.1f);
     EXPECT_EQ(Log().find("SURFACE_ELEVATION"), std::string::npos);
 }

@@ -81,7 +81,6 @@ protected:
         kvtClose(&file);
     }
     void Land(int j, int k) { gGrid.bed[gGrid.At(j, k)] = 1.0f; }
-    void Water(int j, int k) { gGrid.bed[gGrid.At(j, k)] = -1.0f; }
     // Steps from..to as the time loop makes them.
     void Steps(int from, int to) {
         for (int s = from; s <= to; ++s) {
@@ -92,53 +91,6 @@ protected:
 };
 
 using BoundariesDeathTest = Boundaries;
-
-TEST_F(Boundaries, EdgesInnerLinesAndSinglePointsFindTheirSide) {
-    // An inner wall of land along j = 2 with water east of it, and a bay of
-    // one point at (6,3) closed on three sides.
-    for (int k = 1; k <= 5; ++k) Land(2, k);
-    Land(6, 2), Land(6, 4), Land(7, 3);
-    Setup({{0, 5, 0, 1},    // west edge, ends given high first
-           {8, 1, 8, 5},    // east edge
-           {1, 0, 7, 0},    // south edge
-           {7, 6, 1, 6},    // north edge
-           {3, 1, 3, 5},    // inner line, land to the west
-           {6, 3, 6, 3},    // the bay: only the west neighbour is water
-           {4, 6, 4, 6}});  // a single point of the north edge
-    const auto& r = gBoundaries.records;
-    ASSERT_EQ(r.size(), 7u);
-    EXPECT_EQ(r[0].orientation, 1);
-    EXPECT_EQ(r[0].first[1], 1);
-    EXPECT_EQ(r[0].last[1], 5);
-    EXPECT_EQ(r[1].orientation, 3);
-    EXPECT_EQ(r[2].orientation, 4);
-    EXPECT_EQ(r[3].orientation, 2);
-    EXPECT_EQ(r[3].first[0], 1);
-    EXPECT_EQ(r[4].orientation, 1);
-    EXPECT_EQ(r[5].orientation, 3);
-    EXPECT_EQ(r[6].orientation, 2);
-    EXPECT_EQ(BoundaryValues(1).rows, 5);
-    EXPECT_EQ(BoundaryValues(3).rows, 7);
-}
-
-TEST_F(BoundariesDeathTest, SkewLinesAndUnknownSettingsStop) {
-    EXPECT_EXIT(Setup({{1, 1, 3, 3}}), testing::ExitedWithCode(1), "Boundary line is skew to the grid");
-    // An inner line with water on both sides is no boundary either.
-    EXPECT_EXIT(Setup({{4, 1, 4, 5}}), testing::ExitedWithCode(1), "Boundary line is skew to the grid");
-    // A single inner point with two land neighbours.
-    EXPECT_EXIT(Setup({{1, 1, 1, 1}}), testing::ExitedWithCode(1), "Boundary line is skew to the grid");
-    EXPECT_EXIT(Setup({{0, 1, 0, 9}}), testing::ExitedWithCode(1),
-                "SetupOpenBoundaries: boundary 1 has a point outside the grid \\(0..8,0..6\\)");
-    Line flux{0, 1, 0, 5};
-    flux.formulation = 2;
-    EXPECT_EXIT(Setup({flux}), testing::ExitedWithCode(1), "Boundary formulation is unknown");
-    Line spec{0, 1, 0, 5};
-    spec.specification = 3;
-    EXPECT_EXIT(Setup({spec}), testing::ExitedWithCode(1), "Boundary specification is unknown");
-    gEquation.convectiveHandle = 1;
-    EXPECT_EXIT(Setup({{0, 1, 0, 5}}), testing::ExitedWithCode(1),
-                "Only central differencing with side-feeding is allow using open boundaries");
-}
 
 TEST_F(Boundaries, ALevelSeriesIsRampedFromTheSurfaceAtTheLineMiddle) {
     GridState& g = gGrid;
@@ -195,24 +147,92 @@ TEST_F(Boundaries, SeriesFilesAreInterpolatedByTheirMethod) {
     EXPECT_NEAR(s[5 * 3 + 2], 10.0f, 1e-3f);
 }
 
-TEST_F(BoundariesDeathTest, SeriesFilesThatDoNotFitStop) {
-    const int32_t items[2] = {1, 2}, methods[2] = {2, 2};
-    std::vector<float> s;
-    // The run of 20 steps of 0.1 s needs records from 0 to 2 s.
+TEST_F(Boundaries, EveryKindOfLineFindsItsSideAndFillsItsTable) {
+    // Line files: records every 0.5 s from the start; record n holds 10 n + s
+    // at point s, the P item 100 more and the Q item 200 more.
+    auto records = [](int points, float add) {
+        std::vector<std::vector<float>> r(6, std::vector<float>(points));
+        for (int n = 0; n < 6; ++n)
+            for (int s = 0; s < points; ++s) r[n][s] = 10.0f * n + s + add;
+        return r;
+    };
+    bwtest::WriteLineFile(dir / "flux.xol1", kStart, 0.5, 2.0f, {records(5, 0.0f)});
+    bwtest::WriteLineFile(dir / "hot.xol1", kStart, 0.5, 1.0f,
+                          {records(7, 0.0f), records(7, 100.0f), records(7, 200.0f)}, 1);
+    // An inner wall of land along j = 2 with water east of it, and a bay of
+    // one point at (6,3) closed on three sides.
+    for (int k = 1; k <= 5; ++k) Land(2, k);
+    Land(6, 2), Land(6, 4), Land(7, 3);
+    std::fill(gGrid.xi.begin(), gGrid.xi.end(), 0.2f);
+    gEquation.deepWaterTerms = true;
+    Setup({{0, 5, 0, 1, 0, 0, "level.xol0", 2},  // 1: level from a series, west edge, high end first
+           {8, 1, 8, 5, 1, 0, "level.xol0", 2},  // 2: flux from a series, east edge
+           {3, 1, 3, 5, 1, 1, "flux.xol1"},      // 3: flux from a line file, land to the west
+           {7, 0, 1, 0, 0, 2, "hot.xol1"},       // 4: level from hot transfer data, south edge
+           {1, 6, 7, 6, 1, 2, "hot.xol1"},       // 5: flux from hot transfer data, north edge
+           {6, 3, 6, 3, 0, 0, "level.xol0", 2},  // 6: the bay, only its west neighbour water
+           {4, 6, 4, 6, 0, 0, "level.xol0", 2}});  // 7: a single point of the north edge
+    // The side of the water each line closes (1 west, 2 north, 3 east, 4
+    // south), ends sorted, and a row of the table for each point.
+    const int sides[7] = {1, 3, 1, 4, 2, 3, 2}, rows[7] = {5, 5, 5, 7, 7, 1, 1};
+    for (int b = 1; b <= 7; ++b) {
+        EXPECT_EQ(Boundary(b).orientation, sides[b - 1]) << b;
+        EXPECT_EQ(BoundaryValues(b).rows, rows[b - 1]) << b;
+    }
+    EXPECT_EQ(Boundary(1).first[1], 1);
+    EXPECT_EQ(Boundary(1).last[1], 5);
+    EXPECT_EQ(Boundary(4).first[0], 1);
+    // Step 1 at t = 0.1 s: series item 1 is 0.1, item 2 is 1; step 7 at
+    // t = 0.7 s lies 0.4 of the way from record 1 to record 2 of a line file.
+    const struct {
+        int step, boundary, row, column;
+        float value, tolerance;
+    } cases[] = {
+        {1, 1, 2, 1, 0.1f, 1e-6f},
+        {1, 1, 2, 2, (0.2f + 0.1f) / 2, 1e-6f},  // the mean of the surface and the level
+        {1, 1, 2, 3, 0.0f, 0.0f},
+        {1, 1, 2, 5, 1.0f, 1e-5f},  // the deep-water value
+        {1, 1, 2, 6, 1.0f, 1e-5f},  // step 1: no earlier value, the same one
+        {1, 2, 0, 2, 1.0f, 0.0f},
+        {1, 2, 4, 1, 0.1f, 1e-6f},
+        {2, 1, 0, 5, 2.0f, 1e-5f},
+        {2, 1, 0, 6, 1.5f, 1e-5f},  // half a step earlier
+        {7, 3, 3, 1, 14.0f + 3.0f, 1e-4f},
+        {7, 3, 3, 2, 1.0f, 0.0f},
+        {7, 4, 6, 1, 20.0f, 1e-4f},          // water depth
+        {7, 4, 6, 2, 0.1f + 20.0f, 1e-4f},   // half the surface and the depth
+        {7, 4, 6, 3, 220.0f, 1e-4f},         // Q
+        {7, 4, 6, 4, 120.0f, 1e-4f},         // P
+        {7, 5, 0, 1, 114.0f, 1e-4f},
+        {7, 5, 0, 2, 114.0f, 1e-4f},
+        {7, 5, 0, 4, 114.0f, 1e-4f},
+        {7, 3, 0, 5, 0.0f, 0.0f},  // a line file carries no deep-water value
+        {20, 3, 0, 1, 40.0f, 1e-4f},  // t = 2 s, record 4
+    };
+    int done = 0;
+    for (const auto& c : cases) {
+        if (c.step > done) Steps(done + 1, c.step), done = c.step;
+        EXPECT_NEAR(BoundaryValues(c.boundary).Value(c.row, c.column), c.value, c.tolerance)
+            << "step " << c.step << " boundary " << c.boundary << " (" << c.row << "," << c.column << ")";
+    }
+}
+
+TEST_F(BoundariesDeathTest, LinesSettingsAndFilesThatDoNotFitStop) {
+    auto write = [&](const std::string& name, int items, int points, float spacing, int records = 6) {
+        std::vector<std::vector<std::vector<float>>> v(
+            items, std::vector<std::vector<float>>(records, std::vector<float>(points, 0.0f)));
+        bwtest::WriteLineFile(dir / name, kStart, 0.5, spacing, v);
+    };
+    write("two.xol1", 2, 5, 2.0f);
+    write("cold.xol1", 3, 5, 2.0f);
+    write("dx.xol1", 1, 7, 2.0f);
+    write("dy.xol1", 1, 5, 1.0f);
+    write("count.xol1", 1, 4, 2.0f);
+    write("short.xol1", 1, 5, 2.0f, 4);
+    // Series for the 20 steps of 0.1 s, which need records from 0 to 2 s.
     bwtest::WriteSeriesFile(dir / "exact.xol0", kStart, 0.5, {std::vector<float>(5, 1.0f)});
-    ReadTimeSeries0D(dir / "exact.xol0", 1, items, methods, s);
-    EXPECT_EQ(s.size(), 21u);
     bwtest::WriteSeriesFile(dir / "short.xol0", kStart, 0.5, {std::vector<float>(4, 1.0f)});
-    EXPECT_EXIT(ReadTimeSeries0D(dir / "short.xol0", 1, items, methods, s), testing::ExitedWithCode(1),
-                "XOL data does not cover the simulation period");
     bwtest::WriteSeriesFile(dir / "late.xol0", "2004-01-01 00:00:01", 0.5, {std::vector<float>(9, 1.0f)});
-    EXPECT_EXIT(ReadTimeSeries0D(dir / "late.xol0", 1, items, methods, s), testing::ExitedWithCode(1),
-                "XOL data does not cover the simulation period");
-    EXPECT_EXIT(ReadTimeSeries0D(dir / "exact.xol0", 2, items, methods, s), testing::ExitedWithCode(1),
-                "XOL data does not contain the correct number of items");
-    bwtest::WriteLineFile(dir / "line.xol1", kStart, 0.5, 2.0f, {{{1, 1}, {1, 1}, {1, 1}, {1, 1}, {1, 1}}});
-    EXPECT_EXIT(ReadTimeSeries0D(dir / "line.xol1", 1, items, methods, s), testing::ExitedWithCode(1),
-                "XOL data is not 0D");
     // A series on a relative time axis has no date to meet the run's start.
     XolFile relative = XolCreateHeader("Relative", 1, 0);
     XolSetItem(relative, 1, 100078, "Level", 1000);
@@ -220,87 +240,27 @@ TEST_F(BoundariesDeathTest, SeriesFilesThatDoNotFitStop) {
     XolCreateFile(relative, dir / "relative.xol0");
     for (float v : {0.0f, 1.0f, 2.0f, 3.0f, 4.0f, 5.0f}) XolWriteDynamic(relative, &v);
     XolClose(relative);
-    EXPECT_EXIT(ReadTimeSeries0D(dir / "relative.xol0", 1, items, methods, s), testing::ExitedWithCode(1),
-                "XOL data does not contain a calendar time axis");
-    // With the deep water terms a boundary series needs its second item.
-    gEquation.deepWaterTerms = true;
-    EXPECT_EXIT(Setup({{0, 1, 0, 5}}), testing::ExitedWithCode(1),
-                "SetupOpenBoundaries: the deep water terms need two items in the series");
-}
-
-TEST_F(Boundaries, TablesOfSeriesBoundariesFollowTheFormulation) {
-    gEquation.deepWaterTerms = true;
-    std::fill(gGrid.xi.begin(), gGrid.xi.end(), 0.2f);
-    Line level{0, 1, 0, 5}, flux{8, 1, 8, 5};
-    level.items = flux.items = 2;
-    flux.formulation = 1;
-    Setup({level, flux});
-    Steps(1, 1);
-    // Step 1 at t = 0.1 s: item 1 is 0.1, item 2 is 1.
-    const BoundaryTable& a = BoundaryValues(1);
-    EXPECT_NEAR(a.Value(2, 1), 0.1f, 1e-6f);
-    EXPECT_NEAR(a.Value(2, 2), (0.2f + 0.1f) / 2, 1e-6f);
-    EXPECT_FLOAT_EQ(a.Value(2, 3), 0.0f);
-    EXPECT_NEAR(a.Value(2, 5), 1.0f, 1e-5f);
-    EXPECT_NEAR(a.Value(2, 6), 1.0f, 1e-5f);  // step 1: no earlier value, the same one
-    const BoundaryTable& b = BoundaryValues(2);
-    EXPECT_FLOAT_EQ(b.Value(0, 2), 1.0f);
-    EXPECT_NEAR(b.Value(4, 1), 0.1f, 1e-6f);
-    Steps(2, 2);
-    EXPECT_NEAR(a.Value(0, 5), 2.0f, 1e-5f);
-    EXPECT_NEAR(a.Value(0, 6), 1.5f, 1e-5f);  // half a step earlier
-}
-
-TEST_F(Boundaries, LineFilesAndHotTransferDataFillTheColumns) {
-    // Records every 0.5 s from the start; record n holds 10 n + s at point s,
-    // the P item 100 more and the Q item 200 more.
-    auto records = [](int points, float add) {
-        std::vector<std::vector<float>> r;
-        for (int n = 0; n < 6; ++n) {
-            std::vector<float> v;
-            for (int s = 0; s < points; ++s) v.push_back(10.0f * n + s + add);
-            r.push_back(v);
-        }
-        return r;
-    };
-    bwtest::WriteLineFile(dir / "flux.xol1", kStart, 0.5, 2.0f, {records(5, 0.0f)});
-    bwtest::WriteLineFile(dir / "hot.xol1", kStart, 0.5, 1.0f,
-                          {records(7, 0.0f), records(7, 100.0f), records(7, 200.0f)}, 1);
-    std::fill(gGrid.xi.begin(), gGrid.xi.end(), 0.2f);
-    Line flux{0, 1, 0, 5, 1, 1, "flux.xol1"}, hotLevel{1, 0, 7, 0, 0, 2, "hot.xol1"},
-        hotFlux{1, 6, 7, 6, 1, 2, "hot.xol1"};
-    Setup({flux, hotLevel, hotFlux});
-    Steps(1, 7);  // t = 0.7 s: 0.4 of the way from record 1 to record 2
-    const BoundaryTable& f = BoundaryValues(1);
-    EXPECT_NEAR(f.Value(3, 1), 14.0f + 3.0f, 1e-4f);
-    EXPECT_FLOAT_EQ(f.Value(3, 2), 1.0f);
-    const BoundaryTable& l = BoundaryValues(2);
-    EXPECT_NEAR(l.Value(6, 1), 20.0f, 1e-4f);             // water depth
-    EXPECT_NEAR(l.Value(6, 2), 0.1f + 20.0f, 1e-4f);      // half the surface and the depth
-    EXPECT_NEAR(l.Value(6, 3), 220.0f, 1e-4f);            // Q
-    EXPECT_NEAR(l.Value(6, 4), 120.0f, 1e-4f);            // P
-    const BoundaryTable& h = BoundaryValues(3);
-    EXPECT_NEAR(h.Value(0, 1), 114.0f, 1e-4f);
-    EXPECT_NEAR(h.Value(0, 2), 114.0f, 1e-4f);
-    EXPECT_NEAR(h.Value(0, 4), 114.0f, 1e-4f);
-    Steps(8, 20);
-    EXPECT_NEAR(f.Value(0, 1), 40.0f, 1e-4f);  // t = 2 s, record 4
-}
-
-TEST_F(BoundariesDeathTest, LineFilesThatDoNotFitStop) {
-    auto write = [&](const std::string& name, int items, int points, float spacing, int dataType,
-                     int records = 6) {
-        std::vector<std::vector<std::vector<float>>> v(
-            items, std::vector<std::vector<float>>(records, std::vector<float>(points, 0.0f)));
-        bwtest::WriteLineFile(dir / name, kStart, 0.5, spacing, v, dataType);
-    };
-    write("two.xol1", 2, 5, 2.0f, 0);
-    write("cold.xol1", 3, 5, 2.0f, 0);
-    write("dx.xol1", 1, 7, 2.0f, 0);
-    write("dy.xol1", 1, 5, 1.0f, 0);
-    write("count.xol1", 1, 4, 2.0f, 0);
-    write("short.xol1", 1, 5, 2.0f, 0, 4);
-    const std::vector<std::pair<Line, std::string>> cases = {
+    // deep: with the deep water terms; convective: with another handling of
+    // the convective terms.
+    const struct {
+        Line line;
+        const char* message;
+        bool deep = false, convective = false;
+    } cases[] = {
+        {{1, 1, 3, 3}, "Boundary line is skew to the grid"},
+        {{4, 1, 4, 5}, "Boundary line is skew to the grid"},  // water on both sides
+        {{1, 1, 1, 1}, "Boundary line is skew to the grid"},  // an inner point, two land neighbours
+        {{0, 1, 0, 9}, "SetupOpenBoundaries: boundary 1 has a point outside the grid \\(0..8,0..6\\)"},
+        {{0, 1, 0, 5, 2}, "Boundary formulation is unknown"},
+        {{0, 1, 0, 5, 0, 3}, "Boundary specification is unknown"},
+        {{0, 1, 0, 5}, "Only central differencing with side-feeding is allow using open boundaries",
+         false, true},
+        {{0, 1, 0, 5}, "SetupOpenBoundaries: the deep water terms need two items in the series", true},
+        {{0, 1, 0, 5, 0, 0, "short.xol0"}, "XOL data does not cover the simulation period"},
+        {{0, 1, 0, 5, 0, 0, "late.xol0"}, "XOL data does not cover the simulation period"},
+        {{0, 1, 0, 5, 0, 0, "exact.xol0", 2}, "XOL data does not contain the correct number of items"},
+        {{0, 1, 0, 5, 0, 0, "two.xol1"}, "XOL data is not 0D"},
+        {{0, 1, 0, 5, 0, 0, "relative.xol0"}, "XOL data does not contain a calendar time axis"},
         {{0, 1, 0, 5, 1, 1, "level.xol0"}, "XOL data is not 1D"},
         {{0, 1, 0, 5, 1, 1, "two.xol1"}, "XOL data does not contain the correct number of items"},
         {{0, 1, 0, 5, 1, 2, "cold.xol1"}, "XOL data is not hot transfer data"},
@@ -310,8 +270,19 @@ TEST_F(BoundariesDeathTest, LineFilesThatDoNotFitStop) {
          "XOL data does not have the correct number of grid points \\(x.dir.\\)"},
         {{0, 1, 0, 5, 1, 1, "short.xol1"}, "XOL data does not cover the simulation period"},
     };
-    for (const auto& [line, message] : cases)
-        EXPECT_EXIT(Setup({line}), testing::ExitedWithCode(1), message) << line.file;
+    for (const auto& c : cases)
+        EXPECT_EXIT(
+            {
+                gEquation.deepWaterTerms = c.deep;
+                gEquation.convectiveHandle = c.convective ? 1 : 0;
+                Setup({c.line});
+            },
+            testing::ExitedWithCode(1), c.message)
+            << c.message << " " << c.line.file;
+    // A series that ends at the run's end will do, and the last step reads it.
+    Setup({{0, 1, 0, 5, 0, 0, "exact.xol0"}});
+    Steps(1, 20);
+    EXPECT_FLOAT_EQ(BoundaryValues(1).Value(0, 1), 1.0f);
 }
 
 }  // namespace

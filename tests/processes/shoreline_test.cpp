@@ -17,44 +17,38 @@ double Width(double surface, double bed) {
 }
 
 TEST(StorageWidth, FullAboveTheBedNarrowingIntoTheSlot) {
-    EXPECT_EQ(Width(-1.0, -1.0), 1.0);  // surface at the bed
-    EXPECT_EQ(Width(0.5, -1.0), 1.0);   // above it
-    // Half a metre into a slot of 9 m: r = 0.5/9.
-    EXPECT_DOUBLE_EQ(Width(-1.5, -1.0), kWidth + (1 - kWidth) * std::exp(-kLambda * 0.5 / 9.0));
+    const double r = 0.5 / 9.0;  // half a metre into a slot of 9 m
+    const struct {
+        double surface, bed, width;
+    } cases[] = {
+        {-1.0, -1.0, 1.0},  // surface at the bed
+        {0.5, -1.0, 1.0},   // above it
+        {-1.5, -1.0, kWidth + (1 - kWidth) * std::exp(-kLambda * r)},
+        {-20.0, -10.0, 1.0},  // a bed at or below the slot's bottom has no slot
+        {-20.0, -12.0, 1.0},
+        // A bed far above the slot's bottom measures r against 999 m.
+        {1000.0, 1500.0, kWidth + (1 - kWidth) * std::exp(-kLambda * 500.0 / 999.0)},
+    };
+    for (const auto& c : cases)
+        EXPECT_DOUBLE_EQ(Width(c.surface, c.bed), c.width) << c.surface << " over " << c.bed;
     // Deep in the slot the width tends to w, and it falls all the way.
     EXPECT_NEAR(Width(-9.9, -1.0), kWidth, 1e-4);
     EXPECT_LT(Width(-3.0, -1.0), Width(-1.2, -1.0));
-    // A bed at or below the slot's bottom has no slot.
-    EXPECT_EQ(Width(-20.0, -10.0), 1.0);
-    EXPECT_EQ(Width(-20.0, -12.0), 1.0);
-    // A bed far above the slot's bottom measures r against 999 m.
-    EXPECT_DOUBLE_EQ(StorageWidth(1000.0, -1500.0, kSlotBottom, kMax, kWidth, kLambda),
-                     kWidth + (1 - kWidth) * std::exp(-kLambda * 500.0 / 999.0));
 }
 
-class SlotDepth : public testing::Test {
-protected:
-    void SetUp() override {
-        ResetModelState();
-        gShoreline = ShorelineSettings{};
-        gShoreline.type = 1;
-        gGrid.J = 4, gGrid.K = 0;
-        gGrid.landValue = 1.0f;
-    }
-    void TearDown() override { gShoreline = ShorelineSettings{}; }
-    // The corrected depth of a plain depth v over a bed b.
-    double Corrected(float v, float bed) {
-        float target = v;
-        SlotCorrection(&target, &bed);
-        return target;
-    }
-};
-
-TEST_F(SlotDepth, BranchesMeetAtTheBedAndIntegrateTheWidth) {
+TEST(SlotDepth, BranchesMeetAtTheBedIntegrateTheWidthAndSpareLandAndDeepBeds) {
+    ResetModelState();
+    gShoreline = ShorelineSettings{};
+    gShoreline.type = 1;
+    gGrid.J = 0, gGrid.K = 0;
+    gGrid.landValue = 1.0f;
+    // The corrected depth of a plain depth v over a bed b, at a single point.
+    auto Corrected = [](float v, float bed) {
+        SlotCorrection(&v, &bed);
+        return static_cast<double>(v);
+    };
     const double hs = -1.0 - kSlotBottom, e = std::exp(-kLambda);
     const double atBed = hs * ((1 - e) * (1 - kWidth) / kLambda + kWidth);
-    GridState& g = gGrid;
-    g.J = 0;
     EXPECT_NEAR(Corrected(0.0f, -1.0f), atBed, 1e-6);
     EXPECT_NEAR(Corrected(1e-6f, -1.0f), atBed, 1e-5);
     EXPECT_NEAR(Corrected(-1e-6f, -1.0f), atBed, 1e-5);
@@ -69,17 +63,16 @@ TEST_F(SlotDepth, BranchesMeetAtTheBedAndIntegrateTheWidth) {
     for (int i = 0; i < n; ++i) sum += Width(z0 + (i + 0.5) * (z1 - z0) / n, -1.0);
     sum *= (z1 - z0) / n;
     EXPECT_NEAR(Corrected(static_cast<float>(v), -1.0f), sum, 1e-4);
-}
 
-TEST_F(SlotDepth, LandAndBedsBelowTheSlotKeepThePlainDepth) {
-    GridState& g = gGrid;
-    g.J = 2;
-    float bed[3] = {1.0f, 2.0f, -10.5f};  // at the land value, above it, below the slot
+    // A bed at the land value, above it or below the slot keeps the plain depth.
+    gGrid.J = 2;
+    float bed[3] = {1.0f, 2.0f, -10.5f};
     float depth[3] = {-0.5f, -0.2f, 0.7f};
     SlotCorrection(depth, bed);
     EXPECT_EQ(depth[0], -0.5f);
     EXPECT_EQ(depth[1], -0.2f);
     EXPECT_EQ(depth[2], 0.7f);
+    gShoreline = ShorelineSettings{};
 }
 
 }  // namespace

@@ -21,7 +21,9 @@ bool IsLand(int32_t j, int32_t k) {
     return g.bed[g.At(j, k)] >= g.landValue;
 }
 
-[[noreturn]] void StopSkew() { StopRun("Boundary line is skew to the grid"); }
+[[noreturn]] void StopSkew() {
+    StopRun("Boundary line is skew to the grid");
+}
 
 // The side of the water that the line closes: sorts the ends first.
 int32_t BoundaryOrientation(BoundaryRecord& r) {
@@ -105,7 +107,8 @@ FileTimes CheckPeriod(const XolFile& f) {
     const double runEnd = g.timeStepCount * g.dt;
     const double eps = 1e-6 * std::max(g.dt, 1e-3);
     const double fileEnd = t.start + (t.records - 1) * t.step;
-    if (t.records < 2 || t.start > eps || fileEnd < runEnd - eps || (t.records > 1 && t.step <= 0.0))
+    if (t.records < 2 || t.start > eps || fileEnd < runEnd - eps ||
+        (t.records > 1 && t.step <= 0.0))
         StopRun("XOL data does not cover the simulation period");
     return t;
 }
@@ -127,7 +130,7 @@ void LogSeries(const char* title, const std::vector<float>& values) {
         WriteLine(FormatNumber(static_cast<int32_t>(n), 8) + FormatNumber(values[n], 14));
 }
 
-// Specification 0: the series of the record, ramped over the warm-up period,
+// Data_Specification 0: the series of the record, ramped over the warm-up period,
 // into the series store.
 void StoreBoundarySeries(BoundaryRecord& r) {
     const GridState& g = gGrid;
@@ -144,16 +147,18 @@ void StoreBoundarySeries(BoundaryRecord& r) {
     for (int32_t n = 0; n < rows; ++n) main[n] = table[static_cast<size_t>(n) * count];
     if (deep) {
         deepValues.resize(static_cast<size_t>(rows));
-        for (int32_t n = 0; n < rows; ++n) deepValues[n] = table[static_cast<size_t>(n) * count + 1];
+        for (int32_t n = 0; n < rows; ++n)
+            deepValues[n] = table[static_cast<size_t>(n) * count + 1];
     }
 
     // The ramp of a level boundary starts from the surface the model holds at
     // the middle of the line, so that a raised initial surface has no jump.
     const int32_t W = g.warmUpPeriod;
     if (W > 0) {
-        const float ref = r.formulation == 0
-                              ? g.xi[g.At((r.first[0] + r.last[0]) / 2, (r.first[1] + r.last[1]) / 2)]
-                              : 0.0f;
+        const float ref =
+            r.formulation == 0
+                ? g.xi[g.At((r.first[0] + r.last[0]) / 2, (r.first[1] + r.last[1]) / 2)]
+                : 0.0f;
         for (int32_t i = 1; i <= std::min(W, rows - 1); ++i) {
             const float angle = static_cast<float>((2.0 * i / W - 1.0) * 1.570796);
             const float ramp = (1.0f + std::sin(angle)) / 2.0f;
@@ -174,7 +179,7 @@ void ReadLineRecord(BoundaryLineFile& l, std::vector<float>& buffer, int32_t poi
         XolReadDynamic(l.file, buffer.data() + static_cast<size_t>(i) * points);
 }
 
-// Specification 1 (one item along the line) and 2 (hot transfer data:
+// Data_Specification 1 (one item along the line) and 2 (hot transfer data:
 // "Water depth", "P flux", "Q flux"): the file opened and its first two
 // records read around the start of the run.
 void OpenBoundaryLineFile(const BoundaryRecord& r, int32_t rows, BoundaryLineFile& l) {
@@ -182,9 +187,9 @@ void OpenBoundaryLineFile(const BoundaryRecord& r, int32_t rows, BoundaryLineFil
     XolPrintSummary(l.file);
     const XolFile& f = l.file;
     if (f.dimension != 1) StopRun("XOL data is not 1D");
-    const int32_t items = r.specification == 1 ? 1 : 3;
+    const int32_t items = r.dataSpecification == 1 ? 1 : 3;
     if (f.noDynamicItems != items) StopRun("XOL data does not contain the correct number of items");
-    if (r.specification == 2 && f.dataType != 1) StopRun("XOL data is not hot transfer data");
+    if (r.dataSpecification == 2 && f.dataType != 1) StopRun("XOL data is not hot transfer data");
     const GridState& g = gGrid;
     const bool alongK = r.orientation == 1 || r.orientation == 3;
     const float spacing = alongK ? g.dy : g.dx;
@@ -233,7 +238,8 @@ void AdvanceBoundaryLineFile(int32_t step, int32_t b) {
     for (int32_t i = 0; i < l.itemsInFile; ++i) {
         const float* older = l.older.data() + static_cast<size_t>(i) * rows;
         const float* newer = l.newer.data() + static_cast<size_t>(i) * rows;
-        for (int32_t s = 0; s < rows; ++s) table.Value(s, i + 1) = older[s] * (1.0f - w) + newer[s] * w;
+        for (int32_t s = 0; s < rows; ++s)
+            table.Value(s, i + 1) = older[s] * (1.0f - w) + newer[s] * w;
     }
 }
 
@@ -256,7 +262,8 @@ void ReadTimeSeries0D(const std::string& path, int32_t count, const int32_t* ite
     const int32_t itemsInFile = f.noDynamicItems;
     double w = 0.0;
     const int32_t firstNeeded = std::max(RecordBefore(t, 0.0, w) - 1, 0);
-    const int32_t lastNeeded = std::min(RecordBefore(t, g.timeStepCount * g.dt, w) + 2, t.records - 1);
+    const int32_t lastNeeded =
+        std::min(RecordBefore(t, g.timeStepCount * g.dt, w) + 2, t.records - 1);
     std::vector<float> records;
     try {
         records.assign(static_cast<size_t>(lastNeeded - firstNeeded + 1) * itemsInFile, 0.0f);
@@ -326,7 +333,7 @@ void SetupOpenBoundaries(KvtHandle target) {
         KvtGetIntegerList(data, "First_Point", r.first, 2);
         KvtGetIntegerList(data, "Last_Point", r.last, 2);
         KvtGetInteger(data, "Formulation", r.formulation);
-        KvtGetInteger(data, "Data_Specification", r.specification);
+        KvtGetInteger(data, "Data_Specification", r.dataSpecification);
         const DataFileRef ref = ReadDataFile(data, 4);
         r.fileName = ref.fileName;
         r.itemCount = ref.itemCount;
@@ -336,8 +343,10 @@ void SetupOpenBoundaries(KvtHandle target) {
 
         BoundaryRecord& rec = gBoundaries.records.back();
         rec.orientation = BoundaryOrientation(rec);
-        if (rec.formulation != 0 && rec.formulation != 1) StopRun("Boundary formulation is unknown");
-        if (rec.specification < 0 || rec.specification > 2) StopRun("Boundary specification is unknown");
+        if (rec.formulation != 0 && rec.formulation != 1)
+            StopRun("Boundary formulation is unknown");
+        if (rec.dataSpecification < 0 || rec.dataSpecification > 2)
+            StopRun("Boundary specification is unknown");
 
         BoundaryTable table;
         table.rows = rec.orientation == 1 || rec.orientation == 3 ? rec.last[1] - rec.first[1] + 1
@@ -352,7 +361,7 @@ void SetupOpenBoundaries(KvtHandle target) {
         gBoundaries.boundaryValues.push_back(std::move(table));
         gBoundaries.lineFiles.emplace_back();
 
-        if (rec.specification == 0)
+        if (rec.dataSpecification == 0)
             StoreBoundarySeries(rec);
         else
             OpenBoundaryLineFile(rec, gBoundaries.boundaryValues.back().rows,
@@ -367,9 +376,10 @@ void UpdateBoundaryData(int32_t step) {
         BoundaryTable& t = BoundaryValues(b);
         const bool alongK = r.orientation == 1 || r.orientation == 3;
         auto x = [&](int32_t s) {
-            return alongK ? g.xi[g.At(r.first[0], r.first[1] + s)] : g.xi[g.At(r.first[0] + s, r.first[1])];
+            return alongK ? g.xi[g.At(r.first[0], r.first[1] + s)]
+                          : g.xi[g.At(r.first[0] + s, r.first[1])];
         };
-        if (r.specification == 0) {
+        if (r.dataSpecification == 0) {
             const float L = TsValue(r.seriesId);
             if (r.formulation == 0) {
                 for (int32_t s = 0; s < t.rows; ++s) {
@@ -381,15 +391,15 @@ void UpdateBoundaryData(int32_t step) {
             }
         } else {
             AdvanceBoundaryLineFile(step, b);
-            if (r.specification == 1 && r.formulation == 0) {
+            if (r.dataSpecification == 1 && r.formulation == 0) {
                 // A level along the line: the half-step value as from a series.
                 for (int32_t s = 0; s < t.rows; ++s) t.Value(s, 2) = (x(s) + t.Value(s, 1)) / 2.0f;
-            } else if (r.specification == 2 && r.formulation == 0) {
+            } else if (r.dataSpecification == 2 && r.formulation == 0) {
                 for (int32_t s = 0; s < t.rows; ++s) {
                     t.Value(s, 4) = t.Value(s, 2);
                     t.Value(s, 2) = x(s) / 2.0f + t.Value(s, 1);
                 }
-            } else if (r.specification == 2) {
+            } else if (r.dataSpecification == 2) {
                 for (int32_t s = 0; s < t.rows; ++s) {
                     t.Value(s, 1) = t.Value(s, 2);
                     t.Value(s, 4) = t.Value(s, 2);
@@ -397,7 +407,7 @@ void UpdateBoundaryData(int32_t step) {
             }
         }
         // A line file carries no deep water series: its columns stay 0.
-        if (gEquation.deepWaterTerms && r.specification <= 1 && r.deepSeriesId > 0) {
+        if (gEquation.deepWaterTerms && r.dataSpecification <= 1 && r.deepSeriesId > 0) {
             const float D = TsValue(r.deepSeriesId);
             for (int32_t s = 0; s < t.rows; ++s) {
                 if (step == 1) t.Value(s, 5) = D;

@@ -16,9 +16,9 @@
 struct BoundaryRecord {
     int32_t first[2] = {0, 0};  // (j, k), each coordinate at most that of last
     int32_t last[2] = {0, 0};
-    int32_t orientation = 0;  // 1 west, 2 north, 3 east, 4 south
-    int32_t formulation = 0;  // 0 level, 1 flux
-    int32_t specification = 0;  // 0 series, 1 line file, 2 hot transfer data
+    int32_t orientation = 0;        // 1 west, 2 north, 3 east, 4 south
+    int32_t formulation = 0;        // 0 level, 1 flux
+    int32_t dataSpecification = 0;  // 0 series, 1 line file, 2 hot transfer data
     int32_t seriesId = 0, deepSeriesId = 0;
     std::string fileName;
     int32_t itemCount = 0;
@@ -30,7 +30,9 @@ struct BoundaryRecord {
 struct BoundaryTable {
     int32_t rows = 0;
     std::vector<float> values;  // rows * 6, row-major
-    float& Value(int32_t s, int32_t column) { return values[static_cast<size_t>(s) * 6 + column - 1]; }
+    float& Value(int32_t s, int32_t column) {
+        return values[static_cast<size_t>(s) * 6 + column - 1];
+    }
     float Value(int32_t s, int32_t column) const {
         return values[static_cast<size_t>(s) * 6 + column - 1];
     }
@@ -40,7 +42,7 @@ struct BoundaryTable {
 struct BoundaryLineFile {
     XolFile file;
     int32_t itemsInFile = 0;
-    std::vector<float> older, newer;  // itemsInFile * points, item by item
+    std::vector<float> older, newer;          // itemsInFile * points, item by item
     double olderTime = 0.0, newerTime = 0.0;  // seconds from the file's start
     double fileStep = 0.0;
     double simulationOffset = 0.0;  // simulation start less the file's start, seconds
@@ -51,7 +53,8 @@ struct BoundaryState {
     int32_t numberOfBoundaries = 0;
     std::vector<BoundaryRecord> records;        // record b at index b - 1
     std::vector<BoundaryTable> boundaryValues;  // the same numbering
-    std::vector<BoundaryLineFile> lineFiles;    // the same numbering; used with specification 1, 2
+    std::vector<BoundaryLineFile>
+        lineFiles;  // the same numbering; used with dataSpecification 1, 2
 };
 extern BoundaryState gBoundaries;
 
@@ -63,5 +66,9 @@ void UpdateBoundaryData(int32_t step);
 void ReadTimeSeries0D(const std::string& path, int32_t count, const int32_t* items,
                       const int32_t* methods, std::vector<float>& series);
 // The table of boundary b (from 1).
-inline BoundaryTable& BoundaryValues(int32_t b) { return gBoundaries.boundaryValues[b - 1]; }
-inline const BoundaryRecord& Boundary(int32_t b) { return gBoundaries.records[b - 1]; }
+inline BoundaryTable& BoundaryValues(int32_t b) {
+    return gBoundaries.boundaryValues[b - 1];
+}
+inline const BoundaryRecord& Boundary(int32_t b) {
+    return gBoundaries.records[b - 1];
+}

@@ -275,7 +275,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         const int32_t b = EndBoundary(v, first, k);
         const BoundaryTable& t = BoundaryValues(b);
         const int32_t s = TableRow(b, v.axis == 1 ? first : k, v.axis == 1 ? k : first);
-        if (Boundary(b).specification == 2)
+        if (Boundary(b).dataSpecification == 2)
             w.p[0] = t.Value(s, v.replaceColumn);
         else
             w.p[0] = first == 0 ? v.FEdge[k] : v.F[base - v.along];
@@ -287,7 +287,7 @@ void LoadChainRows(const AxisView& v, int32_t k, int32_t first, int32_t last, bo
         const int32_t b = EndBoundary(v, last, k);
         const BoundaryTable& t = BoundaryValues(b);
         const int32_t s = TableRow(b, v.axis == 1 ? last : k, v.axis == 1 ? k : last);
-        if (Boundary(b).specification == 2) w.p[m] = t.Value(s, v.replaceColumn);
+        if (Boundary(b).dataSpecification == 2) w.p[m] = t.Value(s, v.replaceColumn);
         if (deep) w.sE[m + 1] = 2.0f * w.sE[m] - w.sE[m - 1] + ds2 * t.Value(s, v.gradientColumn);
     } else if (east == 3 && deep) {
         w.sE[m + 1] = w.sE[m];

@@ -13,16 +13,16 @@ using Sections = std::map<std::string, std::string>;
 class ModelFile : public testing::Test {
 protected:
     bwtest::TempDir dir;
-    bwtest::MapSpec spec;
+    bwtest::MapSpec grid;
     void SetUp() override {
-        spec.J = 8, spec.K = 6;
+        grid.J = 8, grid.K = 6;
         // Water of 2 m inside a frame of land.
-        std::vector<float> bed = bwtest::Constant(spec, -2.0f);
-        for (int k = 0; k <= spec.K; ++k)
-            for (int j = 0; j <= spec.J; ++j)
-                if (j == 0 || j == spec.J || k == 0 || k == spec.K)
-                    bed[k * (spec.J + 1) + j] = 1.0f;
-        bwtest::WriteMapFile(dir / "bed.xol2", spec, bed);
+        std::vector<float> bed = bwtest::Constant(grid, -2.0f);
+        for (int k = 0; k <= grid.K; ++k)
+            for (int j = 0; j <= grid.J; ++j)
+                if (j == 0 || j == grid.J || k == 0 || k == grid.K)
+                    bed[k * (grid.J + 1) + j] = 1.0f;
+        bwtest::WriteMapFile(dir / "bed.xol2", grid, bed);
     }
     // Runs the engine on the model; gives the exit code and what it printed.
     bwtest::RunResult Run(const Sections& sections, const std::string& bathymetry = "bed.xol2") {
@@ -32,7 +32,7 @@ protected:
     }
     // The map of one value on the model's grid, as a DATA_FILE section.
     std::string Map(const std::string& name, float value) {
-        bwtest::WriteMapFile(dir / name, spec, bwtest::Constant(spec, value));
+        bwtest::WriteMapFile(dir / name, grid, bwtest::Constant(grid, value));
         return bwtest::DataFileSection(name);
     }
 };
@@ -40,12 +40,12 @@ protected:
 TEST_F(ModelFile, ASoundFileRunsAndItsLogHoldsEverySetting) {
     // Porosity and sponge maps whose frame of land holds values no water
     // point may have: land is not checked.
-    std::vector<float> por = bwtest::Constant(spec, 0.1f), sponge = bwtest::Constant(spec, 0.0f);
-    for (int k = 1; k < spec.K; ++k)
-        for (int j = 1; j < spec.J; ++j)
-            por[k * (spec.J + 1) + j] = 0.6f, sponge[k * (spec.J + 1) + j] = 1.0f;
-    bwtest::WriteMapFile(dir / "por.xol2", spec, por);
-    bwtest::WriteMapFile(dir / "sponge.xol2", spec, sponge);
+    std::vector<float> por = bwtest::Constant(grid, 0.1f), sponge = bwtest::Constant(grid, 0.0f);
+    for (int k = 1; k < grid.K; ++k)
+        for (int j = 1; j < grid.J; ++j)
+            por[k * (grid.J + 1) + j] = 0.6f, sponge[k * (grid.J + 1) + j] = 1.0f;
+    bwtest::WriteMapFile(dir / "por.xol2", grid, por);
+    bwtest::WriteMapFile(dir / "sponge.xol2", grid, sponge);
     const bwtest::RunResult r =
         Run({{"BASIC_MODEL_PARAMETERS", "OPEN_LOG_FILE_AFTER_RUN = 0\n"},
              {"Porosity", "Porosity_Type = true\n" + bwtest::DataFileSection("por.xol2")},

@@ -34,17 +34,17 @@ std::vector<float> Bed() {
 }
 
 // A map file of several items, item n holding base + n at every point.
-void WriteItems(const std::string& path, const bwtest::MapSpec& spec, int items, float base,
+void WriteItems(const std::string& path, const bwtest::MapSpec& grid, int items, float base,
                 int dataType = 0) {
     XolFile f = XolCreateHeader("Test map", items, 2);
     for (int n = 1; n <= items; ++n) XolSetItem(f, n, 100079, "Item " + std::to_string(n), 1000);
-    XolSetAxis(f, 1, spec.dx, 0.0f, spec.J + 1);
-    XolSetAxis(f, 2, spec.dy, 0.0f, spec.K + 1);
+    XolSetAxis(f, 1, grid.dx, 0.0f, grid.J + 1);
+    XolSetAxis(f, 2, grid.dy, 0.0f, grid.K + 1);
     XolSetCalendarAxis(f, 1.0, "2000-01-01 00:00:00");
     XolSetDataType(f, dataType);
     XolSetProjection(f, "NON-UTM", 0.0, 0.0, 0.0);
     XolCreateFile(f, path);
-    std::vector<float> v(static_cast<size_t>(spec.J + 1) * (spec.K + 1));
+    std::vector<float> v(static_cast<size_t>(grid.J + 1) * (grid.K + 1));
     for (int n = 1; n <= items; ++n) {
         std::fill(v.begin(), v.end(), base + n);
         if (n == 2 && dataType == 11) v = Bed();  // a state file holds the bed as item 2
@@ -56,11 +56,11 @@ void WriteItems(const std::string& path, const bwtest::MapSpec& spec, int items,
 class ModelReader : public testing::Test {
 protected:
     bwtest::TempDir dir;
-    bwtest::MapSpec spec;
+    bwtest::MapSpec grid;
     KvtHandle file = 0;
     void SetUp() override {
-        spec.J = 6, spec.K = 4, spec.dx = 2.0f, spec.dy = 3.0f;
-        bwtest::WriteMapFile(dir / "bed.xol2", spec, Bed());
+        grid.J = 6, grid.K = 4, grid.dx = 2.0f, grid.dy = 3.0f;
+        bwtest::WriteMapFile(dir / "bed.xol2", grid, Bed());
         ResetModelState();
         TsReset();
         setenv("TRF", "HUD", 1);  // stop texts go to standard error, where death tests read them
@@ -139,8 +139,8 @@ TEST_F(ModelReader, EquationSettingsAndTheirForcedValues) {
 }
 
 TEST_F(ModelReader, ProcessSettingsOverTheSelectedItemOfTheBathymetry) {
-    bwtest::WriteMapFile(dir / "por.xol2", spec, bwtest::Constant(spec, 0.5f));
-    WriteItems(dir / "three.xol2", spec, 4, -10.0f);
+    bwtest::WriteMapFile(dir / "por.xol2", grid, bwtest::Constant(grid, 0.5f));
+    WriteItems(dir / "three.xol2", grid, 4, -10.0f);
     Read({{"Bathymetry_Selection",
            "DATA_FILE {\nFile_name = file(\"three.xol2\")\nItem_Count = 1\nItem_Numbers = 3\n}\n"},
           {"MOVING_SHORELINE", "type = 1\ndepth = -12\nwidth = 0.02\n"},
@@ -167,7 +167,7 @@ TEST_F(ModelReader, ProcessSettingsOverTheSelectedItemOfTheBathymetry) {
 }
 
 TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
-    WriteItems(dir / "hot.xol2", spec, 18, 100.0f, 11);
+    WriteItems(dir / "hot.xol2", grid, 18, 100.0f, 11);
     Read({{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection("hot.xol2")},
           {"SURFACE_ELEVATION", "-"}});
     const GridState& g = gGrid;
@@ -183,12 +183,12 @@ TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
 using ModelReaderDeathTest = ModelReader;
 
 TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
-    WriteItems(dir / "cold.xol2", spec, 3, 0.0f);
+    WriteItems(dir / "cold.xol2", grid, 3, 0.0f);
     EXPECT_EXIT(Read({{"Bathymetry_Selection",
                        "Hot_Start = true\n" + bwtest::DataFileSection("cold.xol2")}}),
                 testing::ExitedWithCode(1), "XOL data is not hot start data");
     EXPECT_EXIT(Read({}, "absent.xol2"), testing::ExitedWithCode(1), "XOL file can not be opened");
-    bwtest::MapSpec bare = spec;
+    bwtest::MapSpec bare = grid;
     bare.projection = "";
     bwtest::WriteMapFile(dir / "bare.xol2", bare, Bed());
     EXPECT_EXIT(Read({}, "bare.xol2"), testing::ExitedWithCode(1),
@@ -200,7 +200,7 @@ TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
     bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0, {{0.0f, 1.0f}});
     EXPECT_EXIT(Read({{"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("series.xol0")}}),
                 testing::ExitedWithCode(1), "ERR_XOL_NOT2D");
-    bwtest::MapSpec wide = spec;
+    bwtest::MapSpec wide = grid;
     wide.J = 7;
     bwtest::WriteMapFile(dir / "wide.xol2", wide, bwtest::Constant(wide, 1.0f));
     EXPECT_EXIT(Read({{"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("wide.xol2")}}),

@@ -24,7 +24,7 @@ constexpr const char* kStart = "2004-01-01 00:00:00";
 struct Line {
     int j1, k1, j2, k2;
     int formulation = 0;
-    int specification = 0;
+    int dataSpecification = 0;
     std::string file = "level.xol0";
     int items = 1;
 };
@@ -71,8 +71,9 @@ protected:
             const Line& l = lines[i];
             s << "BOUNDARY_DATA_" << i + 1 << " {\nFirst_Point = " << l.j1 << ", " << l.k1
               << "\nLast_Point = " << l.j2 << ", " << l.k2 << "\nFormulation = " << l.formulation
-              << "\nData_Specification = " << l.specification << "\nDATA_FILE {\nFile_name = file(\""
-              << l.file << "\")\nItem_Count = " << l.items << "\nItem_Numbers = 1, 2\n}\n}\n";
+              << "\nData_Specification = " << l.dataSpecification
+              << "\nDATA_FILE {\nFile_name = file(\"" << l.file << "\")\nItem_Count = " << l.items
+              << "\nItem_Numbers = 1, 2\n}\n}\n";
         }
         s << "}\n}\n";
         bwtest::WriteFile(dir / "m.bw", s.str());
@@ -165,13 +166,14 @@ TEST_F(Boundaries, EveryKindOfLineFindsItsSideAndFillsItsTable) {
     Land(6, 2), Land(6, 4), Land(7, 3);
     std::fill(gGrid.xi.begin(), gGrid.xi.end(), 0.2f);
     gEquation.deepWaterTerms = true;
-    Setup({{0, 5, 0, 1, 0, 0, "level.xol0", 2},  // 1: level from a series, west edge, high end first
-           {8, 1, 8, 5, 1, 0, "level.xol0", 2},  // 2: flux from a series, east edge
-           {3, 1, 3, 5, 1, 1, "flux.xol1"},      // 3: flux from a line file, land to the west
-           {7, 0, 1, 0, 0, 2, "hot.xol1"},       // 4: level from hot transfer data, south edge
-           {1, 6, 7, 6, 1, 2, "hot.xol1"},       // 5: flux from hot transfer data, north edge
-           {6, 3, 6, 3, 0, 0, "level.xol0", 2},  // 6: the bay, only its west neighbour water
-           {4, 6, 4, 6, 0, 0, "level.xol0", 2}});  // 7: a single point of the north edge
+    Setup(
+        {{0, 5, 0, 1, 0, 0, "level.xol0", 2},  // 1: level from a series, west edge, high end first
+         {8, 1, 8, 5, 1, 0, "level.xol0", 2},  // 2: flux from a series, east edge
+         {3, 1, 3, 5, 1, 1, "flux.xol1"},      // 3: flux from a line file, land to the west
+         {7, 0, 1, 0, 0, 2, "hot.xol1"},       // 4: level from hot transfer data, south edge
+         {1, 6, 7, 6, 1, 2, "hot.xol1"},       // 5: flux from hot transfer data, north edge
+         {6, 3, 6, 3, 0, 0, "level.xol0", 2},  // 6: the bay, only its west neighbour water
+         {4, 6, 4, 6, 0, 0, "level.xol0", 2}});  // 7: a single point of the north edge
     // The side of the water each line closes (1 west, 2 north, 3 east, 4
     // south), ends sorted, and a row of the table for each point.
     const int sides[7] = {1, 3, 1, 4, 2, 3, 2}, rows[7] = {5, 5, 5, 7, 7, 1, 1};
@@ -199,26 +201,28 @@ TEST_F(Boundaries, EveryKindOfLineFindsItsSideAndFillsItsTable) {
         {2, 1, 0, 6, 1.5f, 1e-5f},  // half a step earlier
         {7, 3, 3, 1, 14.0f + 3.0f, 1e-4f},
         {7, 3, 3, 2, 1.0f, 0.0f},
-        {7, 4, 6, 1, 20.0f, 1e-4f},          // water depth
-        {7, 4, 6, 2, 0.1f + 20.0f, 1e-4f},   // half the surface and the depth
-        {7, 4, 6, 3, 220.0f, 1e-4f},         // Q
-        {7, 4, 6, 4, 120.0f, 1e-4f},         // P
+        {7, 4, 6, 1, 20.0f, 1e-4f},         // water depth
+        {7, 4, 6, 2, 0.1f + 20.0f, 1e-4f},  // half the surface and the depth
+        {7, 4, 6, 3, 220.0f, 1e-4f},        // Q
+        {7, 4, 6, 4, 120.0f, 1e-4f},        // P
         {7, 5, 0, 1, 114.0f, 1e-4f},
         {7, 5, 0, 2, 114.0f, 1e-4f},
         {7, 5, 0, 4, 114.0f, 1e-4f},
-        {7, 3, 0, 5, 0.0f, 0.0f},  // a line file carries no deep-water value
+        {7, 3, 0, 5, 0.0f, 0.0f},     // a line file carries no deep-water value
         {20, 3, 0, 1, 40.0f, 1e-4f},  // t = 2 s, record 4
     };
     int done = 0;
     for (const auto& c : cases) {
         if (c.step > done) Steps(done + 1, c.step), done = c.step;
         EXPECT_NEAR(BoundaryValues(c.boundary).Value(c.row, c.column), c.value, c.tolerance)
-            << "step " << c.step << " boundary " << c.boundary << " (" << c.row << "," << c.column << ")";
+            << "step " << c.step << " boundary " << c.boundary << " (" << c.row << "," << c.column
+            << ")";
     }
 }
 
 TEST_F(BoundariesDeathTest, LinesSettingsAndFilesThatDoNotFitStop) {
-    auto write = [&](const std::string& name, int items, int points, float spacing, int records = 6) {
+    auto write = [&](const std::string& name, int items, int points, float spacing,
+                     int records = 6) {
         std::vector<std::vector<std::vector<float>>> v(
             items, std::vector<std::vector<float>>(records, std::vector<float>(points, 0.0f)));
         bwtest::WriteLineFile(dir / name, kStart, 0.5, spacing, v);
@@ -232,7 +236,8 @@ TEST_F(BoundariesDeathTest, LinesSettingsAndFilesThatDoNotFitStop) {
     // Series for the 20 steps of 0.1 s, which need records from 0 to 2 s.
     bwtest::WriteSeriesFile(dir / "exact.xol0", kStart, 0.5, {std::vector<float>(5, 1.0f)});
     bwtest::WriteSeriesFile(dir / "short.xol0", kStart, 0.5, {std::vector<float>(4, 1.0f)});
-    bwtest::WriteSeriesFile(dir / "late.xol0", "2004-01-01 00:00:01", 0.5, {std::vector<float>(9, 1.0f)});
+    bwtest::WriteSeriesFile(dir / "late.xol0", "2004-01-01 00:00:01", 0.5,
+                            {std::vector<float>(9, 1.0f)});
     // A series on a relative time axis has no date to meet the run's start.
     XolFile relative = XolCreateHeader("Relative", 1, 0);
     XolSetItem(relative, 1, 100078, "Level", 1000);
@@ -250,22 +255,30 @@ TEST_F(BoundariesDeathTest, LinesSettingsAndFilesThatDoNotFitStop) {
         {{1, 1, 3, 3}, "Boundary line is skew to the grid"},
         {{4, 1, 4, 5}, "Boundary line is skew to the grid"},  // water on both sides
         {{1, 1, 1, 1}, "Boundary line is skew to the grid"},  // an inner point, two land neighbours
-        {{0, 1, 0, 9}, "SetupOpenBoundaries: boundary 1 has a point outside the grid \\(0..8,0..6\\)"},
+        {{0, 1, 0, 9},
+         "SetupOpenBoundaries: boundary 1 has a point outside the grid \\(0..8,0..6\\)"},
         {{0, 1, 0, 5, 2}, "Boundary formulation is unknown"},
         {{0, 1, 0, 5, 0, 3}, "Boundary specification is unknown"},
-        {{0, 1, 0, 5}, "Only central differencing with side-feeding is allow using open boundaries",
-         false, true},
-        {{0, 1, 0, 5}, "SetupOpenBoundaries: the deep water terms need two items in the series", true},
+        {{0, 1, 0, 5},
+         "Only central differencing with side-feeding is allow using open boundaries",
+         false,
+         true},
+        {{0, 1, 0, 5},
+         "SetupOpenBoundaries: the deep water terms need two items in the series",
+         true},
         {{0, 1, 0, 5, 0, 0, "short.xol0"}, "XOL data does not cover the simulation period"},
         {{0, 1, 0, 5, 0, 0, "late.xol0"}, "XOL data does not cover the simulation period"},
-        {{0, 1, 0, 5, 0, 0, "exact.xol0", 2}, "XOL data does not contain the correct number of items"},
+        {{0, 1, 0, 5, 0, 0, "exact.xol0", 2},
+         "XOL data does not contain the correct number of items"},
         {{0, 1, 0, 5, 0, 0, "two.xol1"}, "XOL data is not 0D"},
         {{0, 1, 0, 5, 0, 0, "relative.xol0"}, "XOL data does not contain a calendar time axis"},
         {{0, 1, 0, 5, 1, 1, "level.xol0"}, "XOL data is not 1D"},
         {{0, 1, 0, 5, 1, 1, "two.xol1"}, "XOL data does not contain the correct number of items"},
         {{0, 1, 0, 5, 1, 2, "cold.xol1"}, "XOL data is not hot transfer data"},
-        {{1, 0, 7, 0, 1, 1, "dx.xol1"}, "XOL data does not have the correct grid spacing \\(x-dir.\\)"},
-        {{0, 1, 0, 5, 1, 1, "dy.xol1"}, "XOL data does not have the correct grid spacing \\(y-dir.\\)"},
+        {{1, 0, 7, 0, 1, 1, "dx.xol1"},
+         "XOL data does not have the correct grid spacing \\(x-dir.\\)"},
+        {{0, 1, 0, 5, 1, 1, "dy.xol1"},
+         "XOL data does not have the correct grid spacing \\(y-dir.\\)"},
         {{0, 1, 0, 5, 1, 1, "count.xol1"},
          "XOL data does not have the correct number of grid points \\(x.dir.\\)"},
         {{0, 1, 0, 5, 1, 1, "short.xol1"}, "XOL data does not cover the simulation period"},

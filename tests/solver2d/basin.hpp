@@ -24,7 +24,7 @@ struct BasinSpec {
 };
 
 // Resets the model state and builds the basin; bed of water points is -depth.
-void MakeBasin(const BasinSpec& spec);
+void MakeBasin(const BasinSpec& basin);
 // Sets the cold-start surface at every point (land keeps its own).
 void SetSurface(const std::function<float(float x, float y)>& surface);
 // Chains and buffers, then steps 1..steps, calling after(n) behind each.

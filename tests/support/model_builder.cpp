@@ -8,21 +8,21 @@
 
 namespace bwtest {
 
-void WriteMapFile(const std::string& path, const MapSpec& spec, const std::vector<float>& values) {
+void WriteMapFile(const std::string& path, const MapSpec& grid, const std::vector<float>& values) {
     XolFile f = XolCreateHeader("Test map", 1, 2);
-    XolSetItem(f, 1, 100079, spec.itemName, 1000);
-    XolSetAxis(f, 1, spec.dx, 0.0f, spec.J + 1);
-    XolSetAxis(f, 2, spec.dy, 0.0f, spec.K + 1);
+    XolSetItem(f, 1, 100079, grid.itemName, 1000);
+    XolSetAxis(f, 1, grid.dx, 0.0f, grid.J + 1);
+    XolSetAxis(f, 2, grid.dy, 0.0f, grid.K + 1);
     XolSetCalendarAxis(f, 1.0, "2000-01-01 00:00:00");
-    XolSetDataType(f, spec.dataType);
-    XolSetProjection(f, spec.projection, spec.longitude, spec.latitude, spec.orientation);
+    XolSetDataType(f, grid.dataType);
+    XolSetProjection(f, grid.projection, grid.longitude, grid.latitude, grid.orientation);
     XolCreateFile(f, path);
     XolWriteDynamic(f, values.data());
     XolClose(f);
 }
 
-std::vector<float> Constant(const MapSpec& spec, float value) {
-    return std::vector<float>(static_cast<size_t>(spec.J + 1) * (spec.K + 1), value);
+std::vector<float> Constant(const MapSpec& grid, float value) {
+    return std::vector<float>(static_cast<size_t>(grid.J + 1) * (grid.K + 1), value);
 }
 
 void WriteSeriesFile(const std::string& path, const std::string& start, double step,

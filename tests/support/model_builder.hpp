@@ -19,9 +19,9 @@ struct MapSpec {
     std::string itemName = "Bathymetry";
     int dataType = 0;
 };
-void WriteMapFile(const std::string& path, const MapSpec& spec, const std::vector<float>& values);
+void WriteMapFile(const std::string& path, const MapSpec& grid, const std::vector<float>& values);
 // A map of one value everywhere.
-std::vector<float> Constant(const MapSpec& spec, float value);
+std::vector<float> Constant(const MapSpec& grid, float value);
 
 // A 0-dimensional series file: items[i][n] is item i at start + n*step seconds.
 void WriteSeriesFile(const std::string& path, const std::string& start, double step,

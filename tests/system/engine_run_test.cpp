@@ -16,12 +16,12 @@ namespace {
 // A small complete model: a basin of 2 m water in a frame of land, still
 // at the start, run for two steps without processes or outputs.
 void WriteSmallModel(const bwtest::TempDir& dir, const std::string& name) {
-    bwtest::MapSpec spec;
-    spec.J = 8, spec.K = 6;
-    std::vector<float> bed = bwtest::Constant(spec, 1.0f);
-    for (int k = 1; k < spec.K; ++k)
-        for (int j = 1; j < spec.J; ++j) bed[k * (spec.J + 1) + j] = -2.0f;
-    bwtest::WriteMapFile(dir / "bed.xol2", spec, bed);
+    bwtest::MapSpec grid;
+    grid.J = 8, grid.K = 6;
+    std::vector<float> bed = bwtest::Constant(grid, 1.0f);
+    for (int k = 1; k < grid.K; ++k)
+        for (int j = 1; j < grid.J; ++j) bed[k * (grid.J + 1) + j] = -2.0f;
+    bwtest::WriteMapFile(dir / "bed.xol2", grid, bed);
     bwtest::WriteFile(
         dir / name,
         bwtest::ModelText("bed.xol2", {{"BASIC_MODEL_PARAMETERS", "OPEN_LOG_FILE_AFTER_RUN = 0\n"},

@@ -279,6 +279,18 @@ void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value,
         [](const std::string& v) { return std::string(TrimRight(v)); });
 }
 
+std::string KvtTrimmedString(KvtHandle section, std::string_view key, int width,
+                             std::string fallback) {
+    KvtGetString(section, key, fallback, width);
+    return std::string(TrimRight(fallback));
+}
+
+std::string KvtTrimmedFilename(KvtHandle section, std::string_view key, int width) {
+    std::string value;
+    KvtGetFilename(section, key, value, width);
+    return std::string(TrimRight(value));
+}
+
 namespace {
 
 template <typename T>

@@ -54,6 +54,12 @@ void KvtGetString(KvtHandle section, std::string_view key, std::string& value, i
 // behind the last folder separator when TRNLIB_LOG_NOPATH is set.
 void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width = 0,
                     int instance = 1, int param = 1, int* status = nullptr);
+// The value of a text or file-name key, fitted to width as above and with its
+// trailing blanks cut; the fallback stands when the key is absent from a
+// section that allows it.
+std::string KvtTrimmedString(KvtHandle section, std::string_view key, int width,
+                             std::string fallback = "");
+std::string KvtTrimmedFilename(KvtHandle section, std::string_view key, int width);
 // Parameters 1 to count of the first instance of the key.
 void KvtGetIntegerList(KvtHandle section, std::string_view key, int32_t* values, int count,
                        int* status = nullptr);

@@ -92,9 +92,7 @@ void ReadOptionParameters(KvtHandle target) {
     KvtGetInteger(section, "type_of_supg", o.typeOfSupg);
     KvtGetDouble(section, "supg_coefficient", o.supgCoefficient);
     KvtGetDouble(section, "interpolation_type", o.interpolationType);
-    std::string editor = o.nameOfTextEditor;
-    KvtGetString(section, "Name_of_Text_Editor", editor, 256);
-    o.nameOfTextEditor = std::string(TrimRight(editor));
+    o.nameOfTextEditor = KvtTrimmedString(section, "Name_of_Text_Editor", 256, o.nameOfTextEditor);
     KvtGetInteger(section, "HUD_update_2DH", o.hudUpdate2DH);
     KvtGetInteger(section, "HUD_update_1DH", o.hudUpdate1DH);
     KvtGetDouble(section, "minimum_depth", o.minimumDepth);
@@ -120,9 +118,7 @@ void StopOnUnavailable() {
 DataFileRef ReadDataFile(KvtHandle parent, int32_t maxItems) {
     const KvtHandle section = KvtOpenSection(parent, "DATA_FILE");
     DataFileRef ref;
-    std::string name;
-    KvtGetFilename(section, "File_name", name, 256);
-    ref.fileName = std::string(TrimRight(name));
+    ref.fileName = KvtTrimmedFilename(section, "File_name", 256);
     KvtGetInteger(section, "Item_Count", ref.itemCount);
     ref.itemCount = std::clamp(ref.itemCount, 0, std::min(maxItems, 15));
     // The first number selects the item, so it is read even for a count of 0.

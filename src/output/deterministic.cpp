@@ -129,9 +129,7 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
                     OutputRecord2D& r) {
     const KvtHandle section = KvtOpenSection(parent, Filled("Output_Spec_Data_%", number));
     const GridState& g = gGrid;
-    std::string name;
-    KvtGetFilename(section, "File_Name", name, 256);
-    r.fileName = std::string(TrimRight(name));
+    r.fileName = KvtTrimmedFilename(section, "File_Name", 256);
     const int32_t fromExtension = OutputTypeFromExtension(r.fileName);
     if (fromExtension < 0) StopRun("SetupOutputDeterministic2D: Wrong file extension");
     r.type = fromExtension;
@@ -185,9 +183,7 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
     ReadRange(section, "Item_Numbers", r.numberOfItems, r.itemNumbers);
     for (int32_t item : r.itemNumbers)
         if (item < 1 || item > keys.maxItem) StopRun(kWrongItem);
-    std::string title;
-    KvtGetString(section, "Title", title, 40);
-    r.title = std::string(TrimRight(title));
+    r.title = KvtTrimmedString(section, "Title", 40);
     if (keys.typeOfLand) KvtGetInteger(section, "Type_Of_Land", r.typeOfLand);
 }
 

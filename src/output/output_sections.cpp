@@ -77,17 +77,11 @@ void SetupOutputDisturbance2D(KvtHandle target) {
     KvtGetIntegerList(section, "Item_Numbers", d.itemNumbers.data(), d.numberOfItems);
     for (int32_t item : d.itemNumbers)
         if (item < 1 || item > kDisturbanceItems) StopRun("WriteOutputStatistic: Wrong type of item");
-    std::string text;
-    KvtGetString(section, "Title", text, 40);
-    d.title = std::string(TrimRight(text));
-    text.clear();
-    KvtGetFilename(section, "File_Name", text, 255);
-    d.fileName = std::string(TrimRight(text));
+    d.title = KvtTrimmedString(section, "Title", 40);
+    d.fileName = KvtTrimmedFilename(section, "File_Name", 255);
     KvtGetInteger(section, "Type_of_Area_Statistic", d.areaStatistic);
     if (d.areaStatistic > 0) {
-        text.clear();
-        KvtGetFilename(section, "File_Name_Area_Statistic", text, 255);
-        d.areaFileName = std::string(TrimRight(text));
+        d.areaFileName = KvtTrimmedFilename(section, "File_Name_Area_Statistic", 255);
         const DataFileRef ref = ReadDataFile(section, 3);
         d.codeMapFile = ref.fileName;
         d.codeMapItem = ref.Item();
@@ -101,12 +95,8 @@ void SetupOutputHotstart2D(KvtHandle target) {
     const KvtHandle section = KvtOpenSection(target, "Output_Hotstart_2D");
     KvtGetLogical(section, "Hot_Start", h.hotStart);
     if (!h.hotStart) return;
-    std::string text;
-    KvtGetString(section, "Title", text, 40);
-    h.title = std::string(TrimRight(text));
-    text.clear();
-    KvtGetFilename(section, "File_Name", text, 256);
-    h.fileName = std::string(TrimRight(text));
+    h.title = KvtTrimmedString(section, "Title", 40);
+    h.fileName = KvtTrimmedFilename(section, "File_Name", 256);
     KvtGetInteger(section, "First_Time_Step", h.firstStep);
     KvtGetInteger(section, "Last_Time_Step", h.lastStep);
     KvtGetInteger(section, "Time_Step_Interval", h.stepInterval);

@@ -311,7 +311,12 @@ double kvtGetDouble(KvtHandle param) {
     return 0.0;
 }
 
+// An integer is rounded to 32 bits at once: through a double it would be
+// rounded twice.
 float kvtGetFloat(KvtHandle param) {
+    const KvtNode* p = Param(param);
+    if (p != nullptr && p->valueKind == KvtValueKind::Integer)
+        return KvtSetError(kKvtOk), static_cast<float>(p->integer);
     return static_cast<float>(kvtGetDouble(param));
 }
 

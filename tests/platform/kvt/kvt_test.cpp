@@ -263,12 +263,12 @@ TEST(KvtLookups, BigSectionsFindEveryInstanceAndTextsStayValid) {
 // are refused.
 TEST(KvtValues, KindsConversionsHandlesAndTheErrorCode) {
     KvtHandle file = Load(
-        "T {\n i = 7, 3000000000, -2147483648\n r = 0.1\n b = true\n s = \"x\"\n"
+        "T {\n i = 7, 3000000000, -2147483648, 18014399583223809\n r = 0.1\n b = true\n s = \"x\"\n"
         " f = file(\"d/b.nc\")\n}\n");
     // Handles taken beforehand, so that no look-up sets the code between the calls.
     const KvtHandle t = Target(file), p = Param(t, "i"), i2 = Param(t, "i", 2);
     const KvtHandle i3 = Param(t, "i", 3), r = Param(t, "r"), b = Param(t, "b"), s = Param(t, "s");
-    const KvtHandle f = Param(t, "f");
+    const KvtHandle f = Param(t, "f"), i4 = Param(t, "i", 4);
     // The code after each call, -1 for a wrong outcome.
     const auto code = [](bool right) { return right ? kvtPeekErrorGlb() : -1; };
     const std::tuple<int, int, const char*> calls[] = {
@@ -276,6 +276,9 @@ TEST(KvtValues, KindsConversionsHandlesAndTheErrorCode) {
         {code(kvtGetInt(r) == 0), kKvtErrKind, "integer of a real"},
         {code(kvtGetInt(i2) == 0), kKvtErrRange, "beyond 32 bits"},
         {code(kvtGetInt(i3) == INT_MIN), kKvtOk, "least 32-bit"},
+        // 2^54 + 2^30 + 1 rounds once, up; through a double it would round
+        // twice and tie down to 2^54.
+        {code(kvtGetFloat(i4) == 0x1.000002p54f), kKvtOk, "32-bit real of a wide integer"},
         {code(!kvtGetBool(p)), kKvtErrKind, "logical of an integer"},
         {code(kvtGetDouble(b) == 0.0), kKvtErrKind, "real of a logical"},
         {code(Same(kvtGetFilename(s), "x")), kKvtOk, "file of a text"},

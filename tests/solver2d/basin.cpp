@@ -6,12 +6,8 @@
 #include <numbers>
 
 #include "data/tsfunc.hpp"
-#include "processes/friction.hpp"
-#include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
 #include "processes/porosity.hpp"
-#include "processes/rollers.hpp"
-#include "processes/shoreline.hpp"
 #include "processes/sponge.hpp"
 #include "run/process.hpp"
 #include "solver2d/model_state.hpp"
@@ -23,27 +19,20 @@ constexpr double kPi = std::numbers::pi;
 
 void MakeBasin(const BasinSpec& s) {
     ResetModelState();
-    gPorosity = PorositySettings{};
-    gShoreline = ShorelineSettings{};
+    gPorosity = PorositySettings{};  // the processes the tests switch on
     gSponge = SpongeSettings{};
     gFilter = FilterSettings{};
-    gFriction = FrictionSettings{};
-    gEddy = EddySettings{};
-    gRollers = RollerSettings{};
-    gGeneration = GenerationState{};
     gBoundaries = BoundaryState{};
     GridState& g = gGrid;
     g.J = s.J, g.K = s.K, g.dx = s.dx, g.dy = s.dy, g.dt = s.dt;
     g.timeStepCount = s.steps;
-    g.lastStep = s.steps - 1;
-    g.landValue = 0.0f;
-    g.bed.assign(g.Points(), -s.depth);
+    g.bed.assign(g.Points(), -1.0f);
     for (int32_t k = 0; k <= g.K; ++k)
         for (int32_t j = 0; j <= g.J; ++j)
             if ((j == 0 && s.frameWest) || j == g.J || k == 0 || k == g.K) g.bed[g.At(j, k)] = 1.0f;
     AllocateModelState();
     gEquation.deepWaterTerms = s.deepWater;
-    gEquation.dispersionFactor = s.deepWater ? s.dispersionFactor : 0.0f;
+    gEquation.dispersionFactor = s.deepWater ? 1.0f / 15.0f : 0.0f;
     gEquation.convectiveHandle = s.convectiveHandle;
     gEquation.extrapolationLower = s.deepWater ? s.extrapolation : 1.0f;
     gPorosity.porosity.assign(g.Points(), 1.0f);
@@ -87,11 +76,6 @@ double SumWater(F f) {
 }
 }  // namespace
 
-double WaterVolume() {
-    const GridState& g = gGrid;
-    return SumWater([&](int, int, size_t p) { return static_cast<double>(g.xi[p]); }) * g.dx * g.dy;
-}
-
 double TotalVolume() {
     const GridState& g = gGrid;
     return SumWater([&](int, int, size_t p) { return static_cast<double>(g.xi[p]) - g.bed[p]; }) *
@@ -103,8 +87,7 @@ double Project(const std::function<double(float, float)>& shape) {
     double num = 0.0, den = 0.0;
     SumWater([&](int j, int k, size_t p) {
         const double s = shape(j * g.dx, k * g.dy);
-        num += s * g.xi[p];
-        den += s * s;
+        num += s * g.xi[p], den += s * s;
         return 0.0;
     });
     return num / den;
@@ -135,15 +118,13 @@ Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t 
     ch.steps = 60 * periods;
     BasinSpec s;
     s.dx = s.dy = static_cast<float>(2.0 * kPi / ch.k / 30.0);
-    s.J = ch.J, s.K = 4, s.dt = ch.dt, s.steps = ch.steps, s.frameWest = false;
-    s.deepWater = deep, s.dispersionFactor = 1.0f / 15.0f;
+    s.J = ch.J, s.K = 4, s.dt = ch.dt, s.steps = ch.steps, s.frameWest = false, s.deepWater = deep;
     MakeBasin(s);
     ch.dx = s.dx;
 
     BoundaryRecord r;
     r.first[0] = 0, r.first[1] = 1, r.last[0] = 0, r.last[1] = s.K - 1;
-    r.orientation = 1;
-    r.formulation = formulation;
+    r.orientation = 1, r.formulation = formulation;
     std::vector<float> series(s.steps + 1), across(s.steps + 1);
     const double amplitude = formulation == 0 ? a : a * ch.c, ramp = 4.0 * T;
     for (int32_t n = 0; n <= s.steps; ++n) {

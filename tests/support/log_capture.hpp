@@ -14,10 +14,9 @@ namespace bwtest {
 struct LogCapture {
     TempDir dir;
     std::string path = dir / "capture.log";
-    int unit = -1;
+    int unit = GetFreeUnit();
 
     LogCapture() {
-        unit = GetFreeUnit();
         OpenUnit(unit, path, "w");
         SetLogUnit(unit);
     }

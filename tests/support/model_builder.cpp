@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include <sstream>
+#include <algorithm>
 
 #include "data/xolfile.hpp"
 
@@ -25,45 +25,47 @@ std::vector<float> Constant(const MapSpec& grid, float value) {
     return std::vector<float>(static_cast<size_t>(grid.J + 1) * (grid.K + 1), value);
 }
 
+namespace {
+
+// A header of levels named as given, the rest "Item n".
+XolFile LevelsHeader(const std::string& title, size_t count, int dimension,
+                     const std::vector<std::string>& names) {
+    XolFile f = XolCreateHeader(title, static_cast<int>(count), dimension);
+    for (size_t i = 0; i < count; ++i)
+        XolSetItem(f, static_cast<int>(i + 1), 100078,
+                   i < names.size() ? names[i] : "Item " + std::to_string(i + 1), 1000);
+    return f;
+}
+
+}  // namespace
+
 void WriteSeriesFile(const std::string& path, const std::string& start, double step,
                      const std::vector<std::vector<float>>& items,
                      const std::vector<std::string>& names) {
-    const int count = static_cast<int>(items.size());
-    XolFile f = XolCreateHeader("Test series", count, 0);
-    for (int i = 0; i < count; ++i)
-        XolSetItem(f, i + 1, 100078, i < static_cast<int>(names.size()) ? names[i]
-                                                                        : "Item " + std::to_string(i + 1),
-                   1000);
+    XolFile f = LevelsHeader("Test series", items.size(), 0, names);
     XolSetCalendarAxis(f, step, start);
     XolCreateFile(f, path);
     for (size_t n = 0; n < items[0].size(); ++n)
-        for (int i = 0; i < count; ++i) XolWriteDynamic(f, &items[i][n]);
+        for (const auto& item : items) XolWriteDynamic(f, &item[n]);
     XolClose(f);
 }
 
 void WriteLineFile(const std::string& path, const std::string& start, double step, float spacing,
                    const std::vector<std::vector<std::vector<float>>>& items, int dataType,
                    const std::vector<std::string>& names) {
-    const int count = static_cast<int>(items.size());
-    XolFile f = XolCreateHeader("Test line", count, 1);
-    for (int i = 0; i < count; ++i)
-        XolSetItem(f, i + 1, 100078, i < static_cast<int>(names.size()) ? names[i]
-                                                                        : "Item " + std::to_string(i + 1),
-                   1000);
+    XolFile f = LevelsHeader("Test line", items.size(), 1, names);
     XolSetAxis(f, 1, spacing, 0.0f, static_cast<int32_t>(items[0][0].size()));
     XolSetCalendarAxis(f, step, start);
     XolSetDataType(f, dataType);
     XolCreateFile(f, path);
     for (size_t n = 0; n < items[0].size(); ++n)
-        for (int i = 0; i < count; ++i) XolWriteDynamic(f, items[i][n].data());
+        for (const auto& item : items) XolWriteDynamic(f, item[n].data());
     XolClose(f);
 }
 
 std::string DataFileSection(const std::string& file, int item) {
-    std::ostringstream s;
-    s << "DATA_FILE {\n    File_name = file(\"" << file << "\")\n    Item_Count = 1\n"
-      << "    Item_Numbers = " << item << "\n}\n";
-    return s.str();
+    return "DATA_FILE {\n    File_name = file(\"" + file + "\")\n    Item_Count = 1\n" +
+           "    Item_Numbers = " + std::to_string(item) + "\n}\n";
 }
 
 std::string ModelText(const std::string& bathymetryFile,
@@ -93,21 +95,16 @@ std::string ModelText(const std::string& bathymetryFile,
         {"Output_Hotstart_2D", "Hot_Start = false\n"},
         {"OPTION_PARAMETERS", "HUD_update_2DH = 0\n"},
     };
-    for (const auto& [name, body] : sections) {
-        bool known = false;
-        for (const auto& d : defaults) known = known || d.first == name;
-        EXPECT_TRUE(known) << "ModelText: no section " << name;
-    }
-    std::ostringstream s;
-    s << "TARNEL_BOUSSINESQ_WAVE {\n";
+    for (const auto& [name, body] : sections)
+        EXPECT_TRUE(std::ranges::any_of(defaults, [&](const auto& d) { return d.first == name; }))
+            << "ModelText: no section " << name;
+    std::string text = "TARNEL_BOUSSINESQ_WAVE {\n";
     for (const auto& [name, fallback] : defaults) {
         const auto given = sections.find(name);
         const std::string& body = given != sections.end() ? given->second : fallback;
-        if (body == "-") continue;
-        s << name << " {\n" << body << "}\n";
+        if (body != "-") text += name + " {\n" + body + "}\n";
     }
-    s << "}\n";
-    return s.str();
+    return text + "}\n";
 }
 
 }  // namespace bwtest

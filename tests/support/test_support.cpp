@@ -6,8 +6,8 @@
 
 #include <cstdlib>
 #include <fstream>
+#include <iterator>
 #include <random>
-#include <sstream>
 
 namespace fs = std::filesystem;
 
@@ -15,24 +15,18 @@ namespace bwtest {
 
 TempDir::TempDir() {
     std::random_device rd;
-    for (;;) {
-        path = fs::temp_directory_path() / ("bwtest_" + std::to_string(rd()));
-        if (fs::create_directory(path)) break;
-    }
+    do path = fs::temp_directory_path() / ("bwtest_" + std::to_string(rd()));
+    while (!fs::create_directory(path));
 }
 
 TempDir::~TempDir() {
-    if (std::getenv("BW_KEEP_TEMP") == nullptr) {
-        std::error_code ec;
-        fs::remove_all(path, ec);
-    }
+    std::error_code ignored;
+    if (std::getenv("BW_KEEP_TEMP") == nullptr) fs::remove_all(path, ignored);
 }
 
 std::string ReadFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
-    std::stringstream ss;
-    ss << in.rdbuf();
-    return ss.str();
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
 }
 
 void WriteFile(const std::string& path, const std::string& text) {
@@ -50,37 +44,38 @@ std::vector<std::string> ReadLines(const std::string& path) {
 
 namespace {
 
+// A scratch file whose name is gone at once, for what a child reads or writes.
+int ScratchFile() {
+    char name[] = "/tmp/bwtest_XXXXXX";
+    const int fd = mkstemp(name);
+    unlink(name);
+    return fd;
+}
+
 std::string Slurp(int fd) {
     std::string text;
     char buf[4096];
     ssize_t n;
+    lseek(fd, 0, SEEK_SET);
     while ((n = read(fd, buf, sizeof buf)) > 0) text.append(buf, static_cast<size_t>(n));
+    close(fd);
     return text;
 }
 
 RunResult Run(const std::vector<std::string>& argv, const std::string& cwd,
               const std::map<std::string, std::string>& env, const std::vector<std::string>& unset,
               const std::string* input) {
-    RunResult result;
     // Output goes to files rather than pipes, so that a chatty child never blocks.
-    char outName[] = "/tmp/bwtest_outXXXXXX";
-    char errName[] = "/tmp/bwtest_errXXXXXX";
-    int outFd = mkstemp(outName);
-    int errFd = mkstemp(errName);
-    pid_t pid = fork();
+    const int inFd = input != nullptr ? ScratchFile() : open("/dev/null", O_RDONLY);
+    const int outFd = ScratchFile(), errFd = ScratchFile();
+    if (input != nullptr && write(inFd, input->data(), input->size()) >= 0)
+        lseek(inFd, 0, SEEK_SET);
+    const pid_t pid = fork();
     if (pid == 0) {
         if (!cwd.empty() && chdir(cwd.c_str()) != 0) _exit(127);
+        dup2(inFd, 0);
         dup2(outFd, 1);
         dup2(errFd, 2);
-        int inFd = open("/dev/null", O_RDONLY);
-        if (input != nullptr) {
-            char inName[] = "/tmp/bwtest_inXXXXXX";
-            inFd = mkstemp(inName);
-            if (write(inFd, input->data(), input->size()) < 0) _exit(127);
-            lseek(inFd, 0, SEEK_SET);
-            unlink(inName);
-        }
-        dup2(inFd, 0);
         for (const auto& name : unset) unsetenv(name.c_str());
         for (const auto& [name, value] : env) setenv(name.c_str(), value.c_str(), 1);
         std::vector<char*> args;
@@ -89,21 +84,11 @@ RunResult Run(const std::vector<std::string>& argv, const std::string& cwd,
         execv(args[0], args.data());
         _exit(127);
     }
+    close(inFd);
     int status = 0;
     waitpid(pid, &status, 0);
-    if (WIFEXITED(status))
-        result.exitCode = WEXITSTATUS(status);
-    else if (WIFSIGNALED(status))
-        result.exitCode = 128 + WTERMSIG(status);
-    lseek(outFd, 0, SEEK_SET);
-    lseek(errFd, 0, SEEK_SET);
-    result.out = Slurp(outFd);
-    result.err = Slurp(errFd);
-    close(outFd);
-    close(errFd);
-    unlink(outName);
-    unlink(errName);
-    return result;
+    return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status), Slurp(outFd),
+            Slurp(errFd)};
 }
 
 }  // namespace

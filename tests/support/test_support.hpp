@@ -30,8 +30,8 @@ struct RunResult {
     std::string err;    // standard error
 };
 
-// Runs argv[0] with the arguments in folder cwd, with the given variables
-// added to (or, with an empty value and unset=true, removed from) the environment.
+// Runs argv[0] with the arguments in folder cwd, the variables of env set in
+// its environment and those named in unset removed.
 RunResult RunProgram(const std::vector<std::string>& argv, const std::string& cwd,
                      const std::map<std::string, std::string>& env = {},
                      const std::vector<std::string>& unset = {});

@@ -51,7 +51,8 @@ protected:
                     b = 1.0f;
                 else if (j >= 7)
                     b = -0.5f;
-                xi[At(j, k)] = 0.02f * std::cos(3.14159f * j / 10) + 0.01f * std::cos(3.14159f * k / 8);
+                xi[At(j, k)] =
+                    0.02f * std::cos(3.14159f * j / 10) + 0.01f * std::cos(3.14159f * k / 8);
             }
         bwtest::WriteMapFile(dir / "bed.xol2", grid, bed);
         bwtest::MapSpec surface = grid;
@@ -70,50 +71,50 @@ protected:
 };
 
 TEST_F(Deterministic, PointsLinesAndAreasHoldTheirItemsOnTheirSubGrids) {
-    std::string records = "Number_Of_Records = 6\n";
-    records += Record(1, "coarse.xol2", "1, 9, 2", "0, 8, 2", "1, 2, 9", 0, 6, 2, "Type_Of_Land = 1\n");
+    std::string records = "Number_Of_Records = 5\n";
+    records +=
+        Record(1, "coarse.xol2", "1, 9, 2", "0, 8, 2", "1, 2, 9", 0, 6, 2, "Type_Of_Land = 1\n");
     records += Record(2, "full.xol2", "0, 10, 1", "0, 8, 1", "3, 4, 11, 12, 2", 1, 5, 1);
-    records += Record(3, "gauges.xol0", "2, 5, 8", "3, 4, 5", "1, 2", 1, 5, 1, "NO_OF_POINTS = 3\n");
-    records += Record(4, "ycut.xol1", "5, 5, 1", "0, 8, 1", "9", 1, 5, 1);
-    records += Record(5, "one.xol1", "4, 4, 1", "4, 4, 1", "2, 3, 4", 1, 5, 1);
-    records += Record(6, "xcut.xol1", "0, 10, 1", "4, 4, 1", "2", 1, 5, 1);
+    records +=
+        Record(3, "gauges.xol0", "2, 5, 8", "3, 4, 5", "1, 2", 1, 5, 1, "NO_OF_POINTS = 3\n");
+    records += Record(4, "one.xol1", "4, 4, 1", "4, 4, 1", "2, 3, 4", 1, 5, 1);
+    records += Record(5, "cut.xol1", "0, 10, 1", "4, 4, 1", "2", 1, 5, 1);
     const bwtest::RunResult r = Run({{"Output_Deterministic_2D", records}});
     ASSERT_EQ(r.exitCode, 0) << r.out;
 
     // The shape of each file: an area with intervals, starting at step 0 with
     // two steps a record; a full area from step 1 (0.1 s after the start);
-    // three points of two items; lines along y and x; one point in a line
-    // file, of dimension 0. Depth, P and Q are hot transfer data (type 1), a
-    // depth alone is flagged -1. An area carries the bathymetry as a static item.
+    // three points of two items; one point in a line file, of dimension 0; a
+    // line along x. Depth, P and Q are hot transfer data (type 1), a depth
+    // alone is flagged -1. An area carries the bathymetry as a static item.
     const std::pair<const char*, const char*> shapes[] = {
-        {"coarse.xol2", "2D, 3+1 items, 4 records every 0.2 s from 2004-01-01 00:00:00 + 0 s, type 0, "
-                        "NON-UTM, axes 5 x 2 from 1, 5 x 4 from 0"},
-        {"full.xol2", "2D, 5+1 items, 5 records every 0.1 s from 2004-01-01 00:00:00 + 0.1 s, type 0, "
-                      "NON-UTM, axes 11 x 1 from 0, 9 x 2 from 0"},
-        {"gauges.xol0", "0D, 6+0 items, 5 records every 0.1 s from 2004-01-01 00:00:00 + 0.1 s, type 0, "
-                        ", axes"},
-        {"ycut.xol1", "1D, 1+0 items, 5 records every 0.1 s from 2004-01-01 00:00:00 + 0.1 s, type 0, "
-                      ", axes 9 x 2 from 0"},
-        {"one.xol1", "0D, 3+0 items, 5 records every 0.1 s from 2004-01-01 00:00:00 + 0.1 s, type 1, , axes"},
-        {"xcut.xol1", "1D, 1+0 items, 5 records every 0.1 s from 2004-01-01 00:00:00 + 0.1 s, type -1, "
-                      ", axes 11 x 1 from 0"},
+        {"coarse.xol2",
+         "2D, 3+1 items, 4 x 0.2 s from +0, type 0, NON-UTM, 5 x 2 from 1, 5 x 4 from 0"},
+        {"full.xol2",
+         "2D, 5+1 items, 5 x 0.1 s from +0.1, type 0, NON-UTM, 11 x 1 from 0, 9 x 2 from 0"},
+        {"gauges.xol0", "0D, 6+0 items, 5 x 0.1 s from +0.1, type 0, "},
+        {"one.xol1", "0D, 3+0 items, 5 x 0.1 s from +0.1, type 1, "},
+        {"cut.xol1", "1D, 1+0 items, 5 x 0.1 s from +0.1, type -1, , 11 x 1 from 0"},
     };
     // Every record of every item of a file: values[file][record][item][point].
     std::map<std::string, std::vector<std::vector<std::vector<float>>>> values;
     std::map<std::string, std::vector<float>> bathymetry;
+    std::string gaugeName;
     for (const auto& [name, shape] : shapes) {
         XolFile f = XolOpenRead(dir / name);
+        EXPECT_EQ(f.startDateTime, "2004-01-01 00:00:00") << name;
         std::ostringstream s;
         s << f.dimension << "D, " << f.noDynamicItems << "+" << f.noStaticItems << " items, "
-          << f.noTimeSteps << " records every " << f.timeStep << " s from " << f.startDateTime << " + "
-          << f.startOffset << " s, type " << f.dataType << ", " << f.projection << ", axes";
+          << f.noTimeSteps << " x " << f.timeStep << " s from +" << f.startOffset << ", type "
+          << f.dataType << ", " << f.projection;
         size_t points = 1;
         for (int a = 0; a < f.dimension; ++a) {
-            s << (a ? ", " : " ") << f.axes[a].count << " x " << f.axes[a].spacing << " from "
+            s << ", " << f.axes[a].count << " x " << f.axes[a].spacing << " from "
               << f.axes[a].origin;
             points *= static_cast<size_t>(f.axes[a].count);
         }
         EXPECT_EQ(s.str(), shape);
+        if (f.dimension == 0 && f.noDynamicItems > 4) gaugeName = f.dynamicItems[4].name;
         if (f.noStaticItems == 1) {
             bathymetry[name].resize(points);
             XolReadStatic(f, bathymetry[name].data());
@@ -128,28 +129,17 @@ TEST_F(Deterministic, PointsLinesAndAreasHoldTheirItemsOnTheirSubGrids) {
     }
     ASSERT_FALSE(HasFailure());
 
-    // The coarse area's bathymetry has land deleted (Type_Of_Land 1); the
-    // full one keeps its level.
-    const auto& b = bathymetry["coarse.xol2"];
-    EXPECT_FLOAT_EQ(b[0], kDelete);        // (1,0) is land
-    EXPECT_FLOAT_EQ(b[1 * 5 + 4], -0.5f);  // (9,2)
-    EXPECT_FLOAT_EQ(b[2 * 5 + 1], -1.0f);  // (3,4)
+    // The coarse area's bathymetry and its still water depth are the bed,
+    // land deleted (Type_Of_Land 1), the latter in every record from the cold
+    // start on; the full area's bathymetry keeps the land's level.
+    for (int p = 0; p < 25; ++p) {
+        const int j = 1 + 2 * (p % 5), k = 2 * (p / 5);
+        const float expected = Land(j, k) ? kDelete : bed[At(j, k)];
+        EXPECT_FLOAT_EQ(bathymetry["coarse.xol2"][p], expected) << j << "," << k;
+        for (const auto& record : values["coarse.xol2"]) EXPECT_FLOAT_EQ(record[2][p], expected);
+    }
     EXPECT_FLOAT_EQ(bathymetry["full.xol2"][0], 1.0f);
-    // Record 1 of a file from step 0 is the cold start itself; surface, water
-    // depth and still water depth agree with each other and with the bed.
-    const auto& c = values["coarse.xol2"];
-    const float xi0 = 0.02f * std::cos(3.14159f * 3 / 10) + 0.01f * std::cos(3.14159f * 4 / 8);
-    EXPECT_FLOAT_EQ(c[0][0][2 * 5 + 1], xi0);
-    EXPECT_FLOAT_EQ(c[0][0][0], kDelete);  // dry: the land of the frame
-    EXPECT_FLOAT_EQ(c[0][2][0], kDelete);  // still water depth on land
-    for (const auto& record : c)
-        for (int p = 0; p < 25; ++p) {
-            const int j = 1 + 2 * (p % 5), k = 2 * (p / 5);
-            if (Land(j, k)) continue;
-            EXPECT_NEAR(record[1][p], record[0][p] - bed[At(j, k)], 1e-6f);  // water depth
-            EXPECT_GT(record[1][p], 0.0f);
-            EXPECT_FLOAT_EQ(record[2][p], bed[At(j, k)]);  // still water depth, negative
-        }
+    EXPECT_FLOAT_EQ(values["coarse.xol2"][0][0][0], kDelete);  // a dry surface at (1,0)
 
     // Velocities of the full area: u from the fluxes on the faces west and
     // east of a point, v from the faces south and north at the two latest
@@ -174,16 +164,8 @@ TEST_F(Deterministic, PointsLinesAndAreasHoldTheirItemsOnTheirSubGrids) {
 
     // Items of several points are named by their point, in point order, and
     // hold the values of the grid at that point.
-    XolFile gauges = XolOpenRead(dir / "gauges.xol0");
-    EXPECT_EQ(gauges.dynamicItems[0].name, "P(2,3): Surface elevation");
-    EXPECT_EQ(gauges.dynamicItems[1].name, "P(2,3): Water depth");
-    EXPECT_EQ(gauges.dynamicItems[4].name, "P(8,5): Surface elevation");
-    XolClose(gauges);
+    EXPECT_EQ(gaugeName, "P(8,5): Surface elevation");
     EXPECT_FLOAT_EQ(values["gauges.xol0"][3][3][0], f[3][4][At(5, 4)]);  // depth at (5,4)
-
-    // Each file's summary reaches the log when it is closed.
-    const std::string log = bwtest::ReadFile(dir / "m.log");
-    EXPECT_NE(log.find("Title  : Record 6"), std::string::npos);
 }
 
 TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
@@ -199,7 +181,6 @@ TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
     const struct {
         std::string section, body, message;
     } cases[] = {
-        {det, one("out.nc", "0, 10, 1", "1"), "SetupOutputDeterministic2D: Wrong file extension"},
         {det, one("out.XOL2", "0, 10, 1", "1"), "SetupOutputDeterministic2D: Wrong file extension"},
         {det, one("out.xol2", "0, 10, 1", "1, 13"), "WriteOutputStatistic: Wrong type of item"},
         {det, one("out.xol1", "0, 11, 1", "1"),
@@ -219,7 +200,8 @@ TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
          "Wave statistics output is not yet available in this version"},
         {"Output_Disturbance_2D", "Type = 1\nTime_Step_Interval = 10\n",
          "Wave disturbance output is not yet available in this version"},
-        {"Output_Hotstart_2D", "Hot_Start = true\n", "Hot-start output is not yet available in this version"},
+        {"Output_Hotstart_2D", "Hot_Start = true\n",
+         "Hot-start output is not yet available in this version"},
     };
     for (const auto& c : cases) {
         const bwtest::RunResult r = Run({{c.section, c.body}});

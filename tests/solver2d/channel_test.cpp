@@ -61,13 +61,13 @@ TEST(BoundaryWave, LevelAndFluxBoundariesSendWavesAtTheCelerityOfTheRelationWith
 
 // A channel of seven wavelengths (30 cells each) driven at its west end by a
 // level boundary with a sine of 2 s and 2 mm in 1 m of water, run for
-// `periods` periods; prepare() sets its processes. Gives the lowest and highest wave
+// `periods` periods, with or without the deep-water terms; prepare() sets its processes. Gives the lowest and highest wave
 // height, relative to the driven one, over columns j0..j1 of the middle row
 // in the last three periods.
 std::pair<double, double> HeightRange(int32_t periods, int32_t j0, int32_t j1,
-                                      const std::function<void()>& prepare) {
+                                      const std::function<void()>& prepare, bool deep = false) {
     const double a = 0.002;
-    const bwtest::Channel ch = bwtest::MakeChannel(0, false, 2.0, a, 7, periods);
+    const bwtest::Channel ch = bwtest::MakeChannel(0, deep, 2.0, a, 7, periods);
     prepare();
     std::vector<double> maxima(ch.J + 1, -1.0), minima(ch.J + 1, 1.0);
     bwtest::RunSteps(ch.steps, [&](int32_t n) {
@@ -109,10 +109,10 @@ TEST(Damping, ASpongeOfOneWavelengthReflectsLessThanFivePercentOfTheEnergy) {
 }
 
 TEST(Damping, APorousStripDampsTheWavePassingThrough) {
-    const auto [olo, ohi] = HeightRange(24, 100, 160, SpongeAtTheEnd);
-    EXPECT_GT(olo, 0.9);  // the open channel carries the wave undamped to the sponge
     // A strip of stones of 5 cm, porosity 0.4, one wavelength wide: behind it
-    // the wave is lower than in the open channel.
+    // the wave is lower than in the open channel. Without the deep-water terms
+    // the forced time extrapolation makes so strong a strip grow a circulation
+    // after some 24 periods; with them (and no extrapolation) it runs steadily.
     auto strip = [] {
         SpongeAtTheEnd();
         gPorosity.porosityType = true;
@@ -121,9 +121,14 @@ TEST(Damping, APorousStripDampsTheWavePassingThrough) {
         for (int32_t k = 0; k <= gGrid.K; ++k)
             for (int32_t j = 60; j < 90; ++j) gPorosity.porosity[gGrid.At(j, k)] = 0.4f;
     };
-    const double shi = HeightRange(24, 100, 160, strip).second;
-    EXPECT_LT(shi, 0.8 * ohi);
-    EXPECT_GT(shi, 0.05);
+    for (const auto& [deep, periods] : {std::pair{false, 20}, std::pair{true, 40}}) {
+        SCOPED_TRACE(deep ? "deep-water terms" : "shallow");
+        const auto [olo, ohi] = HeightRange(periods, 100, 160, SpongeAtTheEnd, deep);
+        EXPECT_GT(olo, 0.9);  // the open channel carries the wave undamped to the sponge
+        const double shi = HeightRange(periods, 100, 160, strip, deep).second;
+        EXPECT_LT(shi, 0.8 * ohi);
+        EXPECT_GT(shi, 0.05);
+    }
 }
 
 TEST(Damping, TheFilterRemovesAGridScaleZigzagAndKeepsASmoothWave) {

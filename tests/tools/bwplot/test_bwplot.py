@@ -21,7 +21,7 @@ try:
     import numpy as np
 except ImportError as e:
     print(f"test_bwplot: skipped, {e.name} cannot be imported (python3-matplotlib, python3-netcdf4)")
-    sys.exit(0)
+    sys.exit(77)  # reported by ctest as skipped
 
 BWPLOT = os.path.normpath(os.path.join(os.path.dirname(os.path.abspath(__file__)),
                                        "../../../tools/bwplot/bwplot"))

@@ -133,13 +133,17 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
     const int32_t fromExtension = OutputTypeFromExtension(r.fileName);
     if (fromExtension < 0) StopRun("SetupOutputDeterministic2D: Wrong file extension");
     r.type = fromExtension;
+    auto atLeastOne = [&](int32_t value, const char* key) {
+        if (value < 1)
+            StopRun(Filled(std::string("SetupOutputDeterministic2D: ") + key +
+                               " of record % must be at least 1",
+                           number));
+    };
     KvtGetInteger(section, "type", r.type);
     if (r.type <= 0) {
         r.noOfPoints = 1;
         KvtGetInteger(section, "NO_OF_POINTS", r.noOfPoints);
-        if (r.noOfPoints < 1)
-            StopRun(Filled("SetupOutputDeterministic2D: NO_OF_POINTS of record % must be at least 1",
-                           number));
+        atLeastOne(r.noOfPoints, "NO_OF_POINTS");
         ReadRange(section, "X_Range_And_Interval", r.noOfPoints, r.xRange);
         ReadRange(section, "Y_Range_And_Interval", r.noOfPoints, r.yRange);
         for (int32_t p = 0; p < r.noOfPoints; ++p)
@@ -170,16 +174,11 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
         KvtGetInteger(section, "First_Time_step", r.firstStep);
         KvtGetInteger(section, "Last_Time_step", r.lastStep);
         KvtGetInteger(section, "Time_Step_Interval", r.stepInterval);
-        if (r.stepInterval < 1)
-            StopRun(Filled("SetupOutputDeterministic2D: Time_Step_Interval of record % must be at "
-                           "least 1",
-                           number));
+        atLeastOne(r.stepInterval, "Time_Step_Interval");
     }
     r.numberOfItems = 1;
     KvtGetInteger(section, "Number_Of_Items", r.numberOfItems);
-    if (r.numberOfItems < 1)
-        StopRun(Filled("SetupOutputDeterministic2D: Number_Of_Items of record % must be at least 1",
-                       number));
+    atLeastOne(r.numberOfItems, "Number_Of_Items");
     ReadRange(section, "Item_Numbers", r.numberOfItems, r.itemNumbers);
     for (int32_t item : r.itemNumbers)
         if (item < 1 || item > keys.maxItem) StopRun(kWrongItem);

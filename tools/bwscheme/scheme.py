@@ -32,8 +32,9 @@ NSTATE = 7
 class Scheme:
     """The settings of a case in the model's own terms."""
 
-    def __init__(self, h, dx, dy, dt, fe, deep, B=None):
+    def __init__(self, h, dx, dy, dt, fe, deep, B=None, filt=0.0):
         self.h, self.dx, self.dy, self.dt = float(h), float(dx), float(dy), float(dt)
+        self.filt = float(filt)  # Grid_scale_filter
         self.fe = float(fe)
         self.deep = bool(deep)
         if B is None:
@@ -102,7 +103,13 @@ def step(s, state, ex, ey):
     sy = Scheme.__new__(Scheme)
     sy.__dict__.update(s.__dict__)
     X2, Q2 = _sweep(sy, X1, Q, Qp, P, P1, pd, XextY, ey, ex, dy, dx)
-    return np.stack([X2, X1, P1, P, Q2, Q, Q - Qp], axis=-1)
+    out = np.stack([X2, X1, P1, P, Q2, Q, Q - Qp], axis=-1)
+    if s.filt > 0.0:
+        # The grid-scale filter at the end of the step: every stored level
+        # minus filt/16 times its fourth differences along x and along y.
+        fx, fy = (ex - 2.0 + 1.0 / ex) ** 2, (ey - 2.0 + 1.0 / ey) ** 2
+        out = out * (1.0 - s.filt / 16.0 * (fx + fy))[..., None]
+    return out
 
 
 def amplification(s, a, b):

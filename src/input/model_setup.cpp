@@ -18,6 +18,7 @@
 #include "run/messages.hpp"
 #include "run/progress.hpp"
 #include "solver2d/model_state.hpp"
+#include "solver2d/scheme_stability.hpp"
 
 BasicSettings gBasic;
 BathymetrySettings gBathymetry;
@@ -157,5 +158,6 @@ void ReadModelSetup(KvtHandle file, const std::string& /*fileName*/) {
     SetupOutputHotstart2D(target);
 
     ReadOptionParameters(target);
+    ReportSchemeStability();
     StopOnUnavailable();
 }

@@ -74,6 +74,7 @@ struct EquationSettings {
     int32_t depthVaryingExtrapolation = 0;
     float extrapolationUpper = 0.0f;
     float waterDepthLimit = 0.0f;
+    float gridScaleFilter = 0.0f;  // Grid_scale_filter: 0 off (grid_filter.hpp)
 };
 extern EquationSettings gEquation;
 

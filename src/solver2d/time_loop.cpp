@@ -13,6 +13,7 @@
 #include "run/progress.hpp"
 #include "run/run_state.hpp"
 #include "solver2d/chains.hpp"
+#include "solver2d/grid_filter.hpp"
 #include "solver2d/model_state.hpp"
 #include "solver2d/sweeps.hpp"
 
@@ -179,6 +180,7 @@ void PrepareTimeLoop() {
     if (gRun.debugLevel == 3) WriteChainTables();
     CountWaterPoints(gChains.activePoints);
     SetupSweepBuffers();
+    if (gEquation.gridScaleFilter > 0.0f) SetupGridScaleFilter();
     gLoop.lineOrderFlag = true;
 }
 
@@ -187,6 +189,10 @@ void ComputeStep(int32_t n) {
     UpdateBoundaryData(n);
     HalfStep(1, n);
     HalfStep(2, n);
+    if (gEquation.gridScaleFilter > 0.0f) {
+        CalcGridScaleFilter();
+        CalculateDepth(gGrid.J, gGrid.K, gGrid.depth.data(), gGrid.bed.data(), gGrid.xi.data());
+    }
 }
 
 void Compute(int& exitCode) {

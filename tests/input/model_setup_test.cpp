@@ -97,6 +97,8 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
         {{{"SURFACE_ELEVATION", "-"}}, "KVT section: SURFACE_ELEVATION not found"},
         {{{"Equation_Parameters", deep + "0.167\n"}},
          "Dispersion factor out of valid range (-0.333 .. 0.166)"},
+        {{{"SOLUTION_PARAMETERS", "Grid_scale_filter = 0.6\n"}},
+         "Grid scale filter out of valid range (0 .. 0.5)"},
         {{{"Porosity", "Porosity_Type = true\n" + Map("por.xol2", 0.1f)}},
          "_SetupPorosity: porosity value outside interval 0.2<=n<=1"},
         {{{"Sponge", "Sponge_Type = true\n" + Map("sponge.xol2", 0.5f)}},

@@ -43,6 +43,7 @@ const char* kUsage =
     "  --dt DT          time step, s (0.02); or --courant C: DT = C DX / sqrt(g H)\n"
     "  --fe F           Time_extrapolation_factor_lower (1; forced to 1 without --deep 1)\n"
     "  --deep 0|1       the deep-water terms, dispersion factor 1/15 (1)\n"
+    "  --filter C       Grid_scale_filter (0)\n"
     "  --family 0|1     0 central sweeps, 1 upwind sweeps (Convective_terms_handle) (0)\n"
     "  --mode MX,MY     standing wave cos(MX pi x/Lx) cos(MY pi y/Ly) (1,1)\n"
     "  --cells NX,NY    water points along x and y; the basin is NX DX by NY DY (40,40)\n"
@@ -62,7 +63,7 @@ const char* kUsage =
     "  --header         print the column names first\n";
 
 struct Options {
-    double h = 0.45, dx = 0.05, dy = 0.0, dt = 0.02, fe = 1.0, courant = 0.0;
+    double h = 0.45, dx = 0.05, dy = 0.0, dt = 0.02, fe = 1.0, courant = 0.0, filter = 0.0;
     bool deep = true;
     int family = 0;
     int mx = 1, my = 1;
@@ -134,6 +135,8 @@ Options Parse(int argc, char** argv) {
             o.fe = x;
         else if (a == "--deep")
             o.deep = x != 0.0;
+        else if (a == "--filter")
+            o.filter = x;
         else if (a == "--family")
             o.family = static_cast<int>(x);
         else if (a == "--ppw")
@@ -219,6 +222,7 @@ void MakeBasin(const Options& o, int32_t steps) {
     gEquation.dispersionFactor = o.deep ? 1.0f / 15.0f : 0.0f;
     gEquation.convectiveHandle = o.family;
     gEquation.extrapolationLower = o.deep ? static_cast<float>(o.fe) : 1.0f;
+    gEquation.gridScaleFilter = static_cast<float>(o.filter);
     gPorosity.porosity.assign(g.Points(), 1.0f);
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();

@@ -3,6 +3,7 @@
 #include <new>
 
 #include "run/messages.hpp"
+#include "solver2d/grid_filter.hpp"
 
 GridState gGrid;
 EquationSettings gEquation;
@@ -38,4 +39,5 @@ void ResetModelState() {
     gEquation = EquationSettings{};
     gChains = ChainTables{};
     gOptions = OptionSettings{};
+    gGridFilter = GridFilterState{};
 }

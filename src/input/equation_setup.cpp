@@ -40,11 +40,11 @@ void ReadSolutionParameters(KvtHandle target) {
     KvtGetReal(section, "Time_extrapolation_factor_upper", e.extrapolationUpper);
     KvtGetReal(section, "Water_depth_limit", e.waterDepthLimit);
     // The grid-scale filter is a key of this engine beside the scheme's own
-    // settings; its default of 0 leaves the scheme as it is. Above 0.5 the
-    // checkerboard mode of the grid would change sign every step.
+    // settings; its default of 0 leaves the scheme as it is. Above 1 the
+    // filter alone would make the checkerboard mode of the grid grow.
     KvtGetReal(section, "Grid_scale_filter", e.gridScaleFilter);
-    if (!(e.gridScaleFilter >= 0.0f && e.gridScaleFilter <= 0.5f))
-        StopRun("Grid scale filter out of valid range (0 .. 0.5)");
+    if (!(e.gridScaleFilter >= 0.0f && e.gridScaleFilter <= 1.0f))
+        StopRun("Grid scale filter out of valid range (0 .. 1)");
     if (!e.deepWaterTerms) {
         // The plain equations centre the dispersive terms in time throughout.
         e.depthVaryingExtrapolation = 0;

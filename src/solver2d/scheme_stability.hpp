@@ -45,8 +45,8 @@ bool SchemeStable(const SchemeCase& c);
 // The largest step at or below c.dt at which no mode grows, by bisection
 // (the stable steps of the scheme form one interval from 0).
 double StableTimeStep(SchemeCase c);
-// The smallest Grid_scale_filter up to 0.5 with which no mode grows at
-// c.dt, or a negative number when 0.5 does not do.
+// The smallest Grid_scale_filter up to 0.8 with which no mode grows at
+// c.dt, or a negative number when 0.8 does not do.
 double StableFilter(SchemeCase c);
 
 // The block "Scheme stability" of the log: the Courant number in the

@@ -8,6 +8,8 @@
 // The x-sweep brings xi to t(m+1/2) and P to t(m+1), the y-sweep xi to t(m+1)
 // and Q to t(m+3/2). Extrapolated surfaces xiExtX (t(m+1/2)) and xiExtY
 // (t(m+1)) and their depths centre the nonlinear terms without iteration.
+// With Grid_scale_filter above 0 the stored levels are filtered at the end
+// of the step (grid_filter.hpp).
 #pragma once
 
 #include <cstdint>

@@ -9,30 +9,39 @@ namespace {
 
 // Bits of a neighbour table: which neighbours along x (east, west) and y
 // (north, south) stand in the same water, whether the place is wet at all,
-// and whether it is filtered.
-constexpr uint8_t kEast = 1, kWest = 2, kNorth = 4, kSouth = 8, kWet = 16, kFiltered = 32;
+// whether it is filtered, and whether the chain ends along x (along y) at
+// an open boundary there, beyond which the flux goes on (even) instead of
+// standing at a closed face (odd).
+constexpr uint8_t kEast = 1, kWest = 2, kNorth = 4, kSouth = 8, kWet = 16, kFiltered = 32,
+                  kOpenX = 64, kOpenY = 128;
 
 bool Water(int32_t j, int32_t k) {
     const GridState& g = gGrid;
     return j >= 0 && j <= g.J && k >= 0 && k <= g.K && gChains.codeX[g.At(j, k)] >= 1;
 }
 
-// An open boundary mark or a generation source at (j,k).
-bool Fed(int32_t j, int32_t k) {
+// An open boundary point at (j,k).
+bool Mark(int32_t j, int32_t k) {
     const GridState& g = gGrid;
     if (j < 0 || j > g.J || k < 0 || k > g.K) return false;
     const size_t p = g.At(j, k);
     const int32_t cx = gChains.codeX[p], cy = gChains.codeY[p];
-    if (cx == kCodeLevelBoundary || cx == kCodeFluxBoundary || cy == kCodeLevelBoundary ||
-        cy == kCodeFluxBoundary)
-        return true;
-    return gGeneration.numberOfRecords > 0 && gGeneration.sourceIndex[p] >= 1;
+    return cx == kCodeLevelBoundary || cx == kCodeFluxBoundary || cy == kCodeLevelBoundary ||
+           cy == kCodeFluxBoundary;
 }
 
-// Whether the plus-shaped stencil of radius 2 around (j,k) meets a fed point.
-bool NearFed(int32_t j, int32_t k) {
+// Whether (j,k) is left alone: an open boundary point, whose values the
+// boundary gives, or a point within two of a generation source along x or y.
+bool Kept(int32_t j, int32_t k) {
+    const GridState& g = gGrid;
+    if (Mark(j, k)) return true;
+    if (gGeneration.numberOfRecords == 0) return false;
+    auto source = [&](int32_t jj, int32_t kk) {
+        return jj >= 0 && jj <= g.J && kk >= 0 && kk <= g.K &&
+               gGeneration.sourceIndex[g.At(jj, kk)] >= 1;
+    };
     for (int32_t d = -2; d <= 2; ++d)
-        if (Fed(j + d, k) || Fed(j, k + d)) return true;
+        if (source(j + d, k) || source(j, k + d)) return true;
     return false;
 }
 
@@ -52,7 +61,8 @@ void SecondDifferences(const float* F, const uint8_t* flag, bool oddX, bool oddY
                 lx[p] = ly[p] = 0.0f;
                 continue;
             }
-            const float c = F[p], mx = oddX ? 0.0f : c, my = oddY ? 0.0f : c;
+            const float c = F[p];
+            const float mx = oddX && !(f & kOpenX) ? 0.0f : c, my = oddY && !(f & kOpenY) ? 0.0f : c;
             lx[p] = ((f & kEast) ? F[p + 1] : mx) - 2.0f * c + ((f & kWest) ? F[p - 1] : mx);
             ly[p] = ((f & kNorth) ? F[p + up] : my) - 2.0f * c + ((f & kSouth) ? F[p - up] : my);
         }
@@ -74,7 +84,8 @@ void FilterField(float* F, const uint8_t* flag, bool oddX, bool oddY, float coef
             const uint8_t f = flag[p];
             if (!(f & kFiltered)) continue;
             const float cx = lx[p], cy = ly[p];
-            const float mx = oddX ? 0.0f : cx, my = oddY ? 0.0f : cy;
+            const float mx = oddX && !(f & kOpenX) ? 0.0f : cx;
+            const float my = oddY && !(f & kOpenY) ? 0.0f : cy;
             const float d = ((f & kEast) ? lx[p + 1] : mx) - 2.0f * cx +
                             ((f & kWest) ? lx[p - 1] : mx) + ((f & kNorth) ? ly[p + up] : my) -
                             2.0f * cy + ((f & kSouth) ? ly[p - up] : my);
@@ -99,14 +110,14 @@ void SetupGridScaleFilter() {
     for (int32_t k = 0; k <= g.K; ++k)
         for (int32_t j = 0; j <= g.J; ++j) {
             const size_t p = g.At(j, k);
-            const bool near = NearFed(j, k);
+            const bool kept = Kept(j, k);
             if (Water(j, k)) {
                 uint8_t f = kWet;
                 if (Water(j + 1, k)) f |= kEast;
                 if (Water(j - 1, k)) f |= kWest;
                 if (Water(j, k + 1)) f |= kNorth;
                 if (Water(j, k - 1)) f |= kSouth;
-                if (!near) f |= kFiltered;
+                if (!kept) f |= kFiltered;
                 s.point[p] = f;
             }
             if (wetX(j, k)) {
@@ -115,7 +126,8 @@ void SetupGridScaleFilter() {
                 if (wetX(j - 1, k)) f |= kWest;
                 if (wetX(j, k + 1)) f |= kNorth;
                 if (wetX(j, k - 1)) f |= kSouth;
-                if (!near && !NearFed(j + 1, k)) f |= kFiltered;
+                if (!kept && !Kept(j + 1, k)) f |= kFiltered;
+                if ((!(f & kWest) && Mark(j, k)) || (!(f & kEast) && Mark(j + 1, k))) f |= kOpenX;
                 s.faceX[p] = f;
             }
             if (wetY(j, k)) {
@@ -124,7 +136,8 @@ void SetupGridScaleFilter() {
                 if (wetY(j - 1, k)) f |= kWest;
                 if (wetY(j, k + 1)) f |= kNorth;
                 if (wetY(j, k - 1)) f |= kSouth;
-                if (!near && !NearFed(j, k + 1)) f |= kFiltered;
+                if (!kept && !Kept(j, k + 1)) f |= kFiltered;
+                if ((!(f & kSouth) && Mark(j, k)) || (!(f & kNorth) && Mark(j, k + 1))) f |= kOpenY;
                 s.faceY[p] = f;
             }
         }

@@ -17,9 +17,10 @@
 // Differences run along the chains. At land the surface is mirrored (no
 // flux through the coast, so the volume of a chain is kept), the flux
 // normal to the coast is odd about the closed face, the flux along it is
-// mirrored. Points within two of an open boundary or an internal
-// generation source are not filtered, so that what the boundary gives is
-// not smoothed on its way in.
+// mirrored; beyond an open boundary every field goes on evenly. The points
+// of an open boundary and the faces beside them keep what the boundary
+// gives, and so do points within two of an internal generation source, so
+// that a wave is not smoothed at its birth.
 #pragma once
 
 #include <cstdint>

@@ -62,7 +62,8 @@ void SecondDifferences(const float* F, const uint8_t* flag, bool oddX, bool oddY
                 continue;
             }
             const float c = F[p];
-            const float mx = oddX && !(f & kOpenX) ? 0.0f : c, my = oddY && !(f & kOpenY) ? 0.0f : c;
+            const float mx = oddX && !(f & kOpenX) ? 0.0f : c,
+                        my = oddY && !(f & kOpenY) ? 0.0f : c;
             lx[p] = ((f & kEast) ? F[p + 1] : mx) - 2.0f * c + ((f & kWest) ? F[p - 1] : mx);
             ly[p] = ((f & kNorth) ? F[p + up] : my) - 2.0f * c + ((f & kSouth) ? F[p - up] : my);
         }
@@ -105,41 +106,33 @@ void SetupGridScaleFilter() {
     s.faceY.assign(n, 0);
     s.lapX.assign(n, 0.0f);
     s.lapY.assign(n, 0.0f);
-    auto wetX = [](int32_t j, int32_t k) { return Water(j, k) && Water(j + 1, k); };
-    auto wetY = [](int32_t j, int32_t k) { return Water(j, k) && Water(j, k + 1); };
+    // The neighbour bits of a place that is wet by the test given: a point,
+    // or the face east (di 1) or north (dk 1) of it.
+    auto table = [](auto wet, int32_t j, int32_t k, int32_t di, int32_t dk) -> uint8_t {
+        if (!wet(j, k)) return 0;
+        uint8_t f = kWet;
+        if (wet(j + 1, k)) f |= kEast;
+        if (wet(j - 1, k)) f |= kWest;
+        if (wet(j, k + 1)) f |= kNorth;
+        if (wet(j, k - 1)) f |= kSouth;
+        if (!Kept(j, k) && !Kept(j + di, k + dk)) f |= kFiltered;
+        return f;
+    };
+    auto point = [](int32_t j, int32_t k) { return Water(j, k); };
+    auto faceX = [](int32_t j, int32_t k) { return Water(j, k) && Water(j + 1, k); };
+    auto faceY = [](int32_t j, int32_t k) { return Water(j, k) && Water(j, k + 1); };
     for (int32_t k = 0; k <= g.K; ++k)
         for (int32_t j = 0; j <= g.J; ++j) {
             const size_t p = g.At(j, k);
-            const bool kept = Kept(j, k);
-            if (Water(j, k)) {
-                uint8_t f = kWet;
-                if (Water(j + 1, k)) f |= kEast;
-                if (Water(j - 1, k)) f |= kWest;
-                if (Water(j, k + 1)) f |= kNorth;
-                if (Water(j, k - 1)) f |= kSouth;
-                if (!kept) f |= kFiltered;
-                s.point[p] = f;
-            }
-            if (wetX(j, k)) {
-                uint8_t f = kWet;
-                if (wetX(j + 1, k)) f |= kEast;
-                if (wetX(j - 1, k)) f |= kWest;
-                if (wetX(j, k + 1)) f |= kNorth;
-                if (wetX(j, k - 1)) f |= kSouth;
-                if (!kept && !Kept(j + 1, k)) f |= kFiltered;
-                if ((!(f & kWest) && Mark(j, k)) || (!(f & kEast) && Mark(j + 1, k))) f |= kOpenX;
-                s.faceX[p] = f;
-            }
-            if (wetY(j, k)) {
-                uint8_t f = kWet;
-                if (wetY(j + 1, k)) f |= kEast;
-                if (wetY(j - 1, k)) f |= kWest;
-                if (wetY(j, k + 1)) f |= kNorth;
-                if (wetY(j, k - 1)) f |= kSouth;
-                if (!kept && !Kept(j, k + 1)) f |= kFiltered;
-                if ((!(f & kSouth) && Mark(j, k)) || (!(f & kNorth) && Mark(j, k + 1))) f |= kOpenY;
-                s.faceY[p] = f;
-            }
+            s.point[p] = table(point, j, k, 0, 0);
+            uint8_t f = table(faceX, j, k, 1, 0);
+            if (f && ((!(f & kWest) && Mark(j, k)) || (!(f & kEast) && Mark(j + 1, k))))
+                f |= kOpenX;
+            s.faceX[p] = f;
+            f = table(faceY, j, k, 0, 1);
+            if (f && ((!(f & kSouth) && Mark(j, k)) || (!(f & kNorth) && Mark(j, k + 1))))
+                f |= kOpenY;
+            s.faceY[p] = f;
         }
 }
 

@@ -2,6 +2,13 @@
 
 #include <new>
 
+#include "processes/friction.hpp"
+#include "processes/internal_generation.hpp"
+#include "processes/open_boundaries.hpp"
+#include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
+#include "processes/shoreline.hpp"
+#include "processes/sponge.hpp"
 #include "run/messages.hpp"
 #include "solver2d/grid_filter.hpp"
 
@@ -12,7 +19,9 @@ OptionSettings gOptions;
 
 namespace {
 
-void Fill(Field& field, size_t points, float value) { field.assign(points, value); }
+void Fill(Field& field, size_t points, float value) {
+    field.assign(points, value);
+}
 
 }  // namespace
 
@@ -40,4 +49,17 @@ void ResetModelState() {
     gChains = ChainTables{};
     gOptions = OptionSettings{};
     gGridFilter = GridFilterState{};
+}
+
+void ResetRunState() {
+    ResetModelState();
+    gPorosity = PorositySettings{};
+    gShoreline = ShorelineSettings{};
+    gSponge = SpongeSettings{};
+    gFilter = FilterSettings{};
+    gFriction = FrictionSettings{};
+    gEddy = EddySettings{};
+    gRollers = RollerSettings{};
+    gGeneration = GenerationState{};
+    gBoundaries = BoundaryState{};
 }

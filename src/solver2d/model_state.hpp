@@ -122,3 +122,6 @@ extern OptionSettings gOptions;
 void AllocateModelState();
 // Forgets the whole state (for tests).
 void ResetModelState();
+// ResetModelState, and every process setting back to what it is before a
+// model is read: for the tools that build a model in memory.
+void ResetRunState();

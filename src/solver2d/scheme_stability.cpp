@@ -13,8 +13,8 @@
 extern "C" {
 void zgeev_(const char* jobvl, const char* jobvr, const int* n, std::complex<double>* a,
             const int* lda, std::complex<double>* w, std::complex<double>* vl, const int* ldvl,
-            std::complex<double>* vr, const int* ldvr, std::complex<double>* work,
-            const int* lwork, double* rwork, int* info);
+            std::complex<double>* vr, const int* ldvr, std::complex<double>* work, const int* lwork,
+            double* rwork, int* info);
 }
 
 namespace {
@@ -43,7 +43,8 @@ void Sweep(const SchemeCase& c, double ds, double dn, cplx ex, cplx ey, cplx X, 
     const double f0 = h * g / ds;
     // Momentum row of a face: G P(j-1) + (1/dt - 2G) P(j) + G P(j+1) - f0 X(j) + f0 X(j+1) = r.
     const cplx corners = (Gnew - Gold) * E1 - Gdiff * E2;
-    cplx r = F / dt + G * (ex - 2.0 + 1.0 / ex) * F + cross * corners * (ex - 1.0) * (1.0 - 1.0 / ey);
+    cplx r =
+        F / dt + G * (ex - 2.0 + 1.0 / ex) * F + cross * corners * (ex - 1.0) * (1.0 - 1.0 / ey);
     if (c.deep) {
         const cplx xx0 = (ex - 2.0 + 1.0 / ex) / (ds * ds);
         const cplx yy0 = (ey - 2.0 + 1.0 / ey) / (dn * dn);
@@ -230,8 +231,8 @@ void ReportSchemeStability() {
     const double courant = std::sqrt(static_cast<double>(kGravity) * deepest) * g.dt / spacing;
 
     WriteBlockHeading("Scheme Stability");
-    WriteLine("  Courant number sqrt(g h) dt/dx in the deepest water: " + Number(courant) +
-              " (h " + Number(deepest) + " m, dx/h " + Number(spacing / deepest) + ")");
+    WriteLine("  Courant number sqrt(g h) dt/dx in the deepest water: " + Number(courant) + " (h " +
+              Number(deepest) + " m, dx/h " + Number(spacing / deepest) + ")");
     SchemeGrowth worst;
     double worstDepth = deepest;
     for (double h = deepest; h >= floor * 0.999; h /= 1.5) {

@@ -71,7 +71,8 @@ TEST(SchemeStability, TheEngineGrowsAtTheRateTheAnalysisGives) {
             auto shape = [&](float x, float y) {
                 return std::cos(m * kPi * (x - 0.025) / L) * std::cos(m * kPi * (y - 0.025) / L);
             };
-            bwtest::SetSurface([&](float x, float y) { return static_cast<float>(1e-7 * shape(x, y)); });
+            bwtest::SetSurface(
+                [&](float x, float y) { return static_cast<float>(1e-7 * shape(x, y)); });
             std::vector<double> a;
             bwtest::RunSteps(80, [&](int32_t) { a.push_back(bwtest::Project(shape)); });
             double s11 = 0.0, s12 = 0.0, s22 = 0.0, r1 = 0.0, r2 = 0.0;

@@ -31,16 +31,7 @@ namespace {
 // A closed basin of n x n points, 10 m deep, 5 m spacing, a standing wave
 // on the diagonal, a Courant number of about 1.
 void MakeBasin(int32_t n, int32_t handle, int32_t steps) {
-    ResetModelState();
-    gPorosity = PorositySettings{};
-    gShoreline = ShorelineSettings{};
-    gSponge = SpongeSettings{};
-    gFilter = FilterSettings{};
-    gFriction = FrictionSettings{};
-    gEddy = EddySettings{};
-    gRollers = RollerSettings{};
-    gGeneration = GenerationState{};
-    gBoundaries = BoundaryState{};
+    ResetRunState();
     GridState& g = gGrid;
     g.J = g.K = n - 1;
     g.dx = g.dy = 5.0f;

@@ -199,16 +199,7 @@ double Omega(double k, double h, double B) {
 // A flat basin of nx by ny water points in a frame of land (j = 0, J and
 // k = 0, K), H deep, every process off but porosity 1.
 void MakeBasin(const Options& o, int32_t steps) {
-    ResetModelState();
-    gPorosity = PorositySettings{};
-    gShoreline = ShorelineSettings{};
-    gSponge = SpongeSettings{};
-    gFilter = FilterSettings{};
-    gFriction = FrictionSettings{};
-    gEddy = EddySettings{};
-    gRollers = RollerSettings{};
-    gGeneration = GenerationState{};
-    gBoundaries = BoundaryState{};
+    ResetRunState();
     GridState& g = gGrid;
     g.J = o.nx + 1, g.K = o.ny + 1;
     g.dx = static_cast<float>(o.dx), g.dy = static_cast<float>(o.dy), g.dt = o.dt;

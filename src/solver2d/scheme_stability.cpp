@@ -205,9 +205,10 @@ SchemeCase ModelCase(double h) {
     return c;
 }
 
-std::string Number(double v) {
+// Three significant figures, or more where a growth factor needs them.
+std::string Number(double v, int figures = 3) {
     char text[32];
-    std::snprintf(text, sizeof text, "%.3g", v);
+    std::snprintf(text, sizeof text, "%.*g", figures, v);
     return text;
 }
 
@@ -241,7 +242,7 @@ void ReportSchemeStability() {
     }
     const double steps = std::max(1, g.timeStepCount);
     const bool grows = worst.rate > kNoGrowth && std::log(worst.rate) * steps > std::log(10.0);
-    WriteLine("  Largest growth of a mode in a step: " + Number(worst.rate) + " (h " +
+    WriteLine("  Largest growth of a mode in a step: " + Number(worst.rate, 6) + " (h " +
               Number(worstDepth) + " m)");
     if (grows) {
         // The step and the filter that leave no mode growing at any depth.

@@ -1,6 +1,7 @@
 #include "solver2d/grid_filter.hpp"
 
 #include "processes/internal_generation.hpp"
+#include "processes/shoreline.hpp"
 #include "solver2d/chains.hpp"
 
 GridFilterState gGridFilter;
@@ -15,7 +16,19 @@ namespace {
 constexpr uint8_t kEast = 1, kWest = 2, kNorth = 4, kSouth = 8, kWet = 16, kFiltered = 32,
                   kOpenX = 64, kOpenY = 128;
 
+// A point of the chains; with the moving shoreline only where the surface
+// stands at or above the bed (a storage width of 1): the filter leaves the
+// slot alone and mirrors the surface at the waterline, so that it moves no
+// water across it.
 bool Water(int32_t j, int32_t k) {
+    const GridState& g = gGrid;
+    if (j < 0 || j > g.J || k < 0 || k > g.K) return false;
+    const size_t p = g.At(j, k);
+    return gChains.codeX[p] >= 1 && (gShoreline.type <= 0 || g.xi[p] >= g.bed[p]);
+}
+
+// A point of the chains, wet or in the slot.
+bool Chain(int32_t j, int32_t k) {
     const GridState& g = gGrid;
     return j >= 0 && j <= g.J && k >= 0 && k <= g.K && gChains.codeX[g.At(j, k)] >= 1;
 }
@@ -101,11 +114,18 @@ void SetupGridScaleFilter() {
     const GridState& g = gGrid;
     GridFilterState& s = gGridFilter;
     const size_t n = g.Points();
+    s.lapX.assign(n, 0.0f);
+    s.lapY.assign(n, 0.0f);
+    MakeFilterTables();
+}
+
+void MakeFilterTables() {
+    const GridState& g = gGrid;
+    GridFilterState& s = gGridFilter;
+    const size_t n = g.Points();
     s.point.assign(n, 0);
     s.faceX.assign(n, 0);
     s.faceY.assign(n, 0);
-    s.lapX.assign(n, 0.0f);
-    s.lapY.assign(n, 0.0f);
     // The neighbour bits of a place that is wet by the test given: a point,
     // or the face east (di 1) or north (dk 1) of it.
     auto table = [](auto wet, int32_t j, int32_t k, int32_t di, int32_t dk) -> uint8_t {
@@ -126,11 +146,15 @@ void SetupGridScaleFilter() {
             const size_t p = g.At(j, k);
             s.point[p] = table(point, j, k, 0, 0);
             uint8_t f = table(faceX, j, k, 1, 0);
-            if (f && ((!(f & kWest) && Mark(j, k)) || (!(f & kEast) && Mark(j + 1, k))))
+            // Beyond an open boundary, and beyond the waterline into the slot,
+            // the flux goes on; only land closes a face.
+            if (f && ((!(f & kWest) && (Mark(j, k) || Chain(j - 1, k))) ||
+                      (!(f & kEast) && (Mark(j + 1, k) || Chain(j + 2, k)))))
                 f |= kOpenX;
             s.faceX[p] = f;
             f = table(faceY, j, k, 0, 1);
-            if (f && ((!(f & kSouth) && Mark(j, k)) || (!(f & kNorth) && Mark(j, k + 1))))
+            if (f && ((!(f & kSouth) && (Mark(j, k) || Chain(j, k - 1))) ||
+                      (!(f & kNorth) && (Mark(j, k + 1) || Chain(j, k + 2)))))
                 f |= kOpenY;
             s.faceY[p] = f;
         }
@@ -140,6 +164,8 @@ void CalcGridScaleFilter() {
     GridState& g = gGrid;
     const GridFilterState& s = gGridFilter;
     const float c = gEquation.gridScaleFilter;
+    // The waterline moves with the moving shoreline: the tables follow it.
+    if (gShoreline.type > 0) MakeFilterTables();
     for (Field* F : {&g.xi, &g.xiPrev}) FilterField(F->data(), s.point.data(), false, false, c);
     // The flux across a face is odd about a closed face along its own axis.
     for (Field* F : {&g.P, &g.PPrev}) FilterField(F->data(), s.faceX.data(), true, false, c);

@@ -20,7 +20,9 @@
 // mirrored; beyond an open boundary every field goes on evenly. The points
 // of an open boundary and the faces beside them keep what the boundary
 // gives, and so do points within two of an internal generation source, so
-// that a wave is not smoothed at its birth.
+// that a wave is not smoothed at its birth. With the moving shoreline the
+// filter works only where the surface stands at or above the bed: the slot
+// is left alone and the surface mirrored at the waterline.
 #pragma once
 
 #include <cstdint>
@@ -36,8 +38,11 @@ struct GridFilterState {
 };
 extern GridFilterState gGridFilter;
 
-// Makes the neighbour tables from the chains' codes (after MakeChains).
+// The work fields and the neighbour tables (after MakeChains).
 void SetupGridScaleFilter();
+// The neighbour tables from the chains' codes and, with the moving
+// shoreline, from the present waterline.
+void MakeFilterTables();
 // Filters the stored levels; called after the y half of a step when the
 // coefficient is above 0. Parallel over rows.
 void CalcGridScaleFilter();

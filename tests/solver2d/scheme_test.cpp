@@ -9,6 +9,7 @@
 #include <numbers>
 #include <string>
 
+#include "processes/shoreline.hpp"
 #include "solver2d/basin.hpp"
 #include "solver2d/chains.hpp"
 #include "solver2d/grid_filter.hpp"
@@ -170,6 +171,54 @@ TEST(GridScaleFilter, TakesTheCheckerboardDownAndKeepsVolumeAndLinearFields) {
             ++checked;
         }
     EXPECT_GT(checked, 100);
+}
+
+TEST(GridScaleFilter, LeavesTheSlotAloneAndMovesNoWaterAcrossTheWaterline) {
+    // A beach in the east of the basin with the moving shoreline: where the
+    // surface stands below the bed (in the slot) nothing changes, and the
+    // wet points keep their volume; a checkerboard on the wet points is taken
+    // down where the stencil meets neither land nor the waterline.
+    bwtest::BasinSpec s;
+    s.J = 24, s.K = 10;
+    bwtest::MakeBasin(s);
+    GridState& g = gGrid;
+    g.landValue = 0.5f;
+    gShoreline.type = 1;
+    for (int32_t k = 1; k < g.K; ++k)
+        for (int32_t j = 14; j < g.J; ++j) g.bed[g.At(j, k)] = -1.0f + 0.15f * (j - 13);
+    auto dry = [&](int32_t j, int32_t k) { return g.bed[g.At(j, k)] > 0.0f; };
+    for (int32_t k = 0; k <= g.K; ++k)
+        for (int32_t j = 0; j <= g.J; ++j) {
+            const size_t p = g.At(j, k);
+            g.xi[p] = g.bed[p] >= g.landValue ? 0.0f
+                      : dry(j, k)             ? g.bed[p] - 0.05f
+                                              : ((j + k) % 2 ? -1e-3f : 1e-3f);
+        }
+    CalculateDepth(g.J, g.K, g.depth.data(), g.bed.data(), g.xi.data());
+    gEquation.gridScaleFilter = 0.3f;
+    MakeChains();
+    SetupGridScaleFilter();
+    const Field before = g.xi;
+    double wet0 = 0.0, wet1 = 0.0;
+    for (size_t p = 0; p < g.Points(); ++p)
+        if (g.bed[p] < 0.0f) wet0 += g.xi[p];
+    CalcGridScaleFilter();
+    int32_t damped = 0;
+    for (int32_t k = 1; k < g.K; ++k)
+        for (int32_t j = 1; j < g.J; ++j) {
+            const size_t p = g.At(j, k);
+            if (dry(j, k)) {
+                EXPECT_EQ(g.xi[p], before[p]) << j << "," << k;
+                continue;
+            }
+            wet1 += g.xi[p];
+            if (k >= 3 && k <= g.K - 3 && j >= 3 && j <= 16 && !dry(j + 2, k)) {
+                EXPECT_NEAR(g.xi[p], before[p] * (1.0f - 2.0f * 0.3f), 1e-7f) << j << "," << k;
+                ++damped;
+            }
+        }
+    EXPECT_NEAR(wet1, wet0, 1e-6);
+    EXPECT_GT(damped, 40);
 }
 
 TEST(GridScaleFilter, MakesTheFineBasinStableAtLittleCostToAResolvedWave) {

@@ -114,18 +114,10 @@ void SetupGridScaleFilter() {
     const GridState& g = gGrid;
     GridFilterState& s = gGridFilter;
     const size_t n = g.Points();
-    s.lapX.assign(n, 0.0f);
-    s.lapY.assign(n, 0.0f);
-    MakeFilterTables();
-}
-
-void MakeFilterTables() {
-    const GridState& g = gGrid;
-    GridFilterState& s = gGridFilter;
-    const size_t n = g.Points();
     s.point.assign(n, 0);
     s.faceX.assign(n, 0);
     s.faceY.assign(n, 0);
+    if (s.lapX.size() != n) s.lapX.assign(n, 0.0f), s.lapY.assign(n, 0.0f);
     // The neighbour bits of a place that is wet by the test given: a point,
     // or the face east (di 1) or north (dk 1) of it.
     auto table = [](auto wet, int32_t j, int32_t k, int32_t di, int32_t dk) -> uint8_t {
@@ -165,7 +157,7 @@ void CalcGridScaleFilter() {
     const GridFilterState& s = gGridFilter;
     const float c = gEquation.gridScaleFilter;
     // The waterline moves with the moving shoreline: the tables follow it.
-    if (gShoreline.type > 0) MakeFilterTables();
+    if (gShoreline.type > 0) SetupGridScaleFilter();
     for (Field* F : {&g.xi, &g.xiPrev}) FilterField(F->data(), s.point.data(), false, false, c);
     // The flux across a face is odd about a closed face along its own axis.
     for (Field* F : {&g.P, &g.PPrev}) FilterField(F->data(), s.faceX.data(), true, false, c);

@@ -38,11 +38,9 @@ struct GridFilterState {
 };
 extern GridFilterState gGridFilter;
 
-// The work fields and the neighbour tables (after MakeChains).
+// The neighbour tables from the chains' codes (after MakeChains) and, with
+// the moving shoreline, from the present waterline; the work fields.
 void SetupGridScaleFilter();
-// The neighbour tables from the chains' codes and, with the moving
-// shoreline, from the present waterline.
-void MakeFilterTables();
 // Filters the stored levels; called after the y half of a step when the
 // coefficient is above 0. Parallel over rows.
 void CalcGridScaleFilter();

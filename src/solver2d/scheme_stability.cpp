@@ -147,7 +147,7 @@ namespace {
 
 // The modes that grew last: a step or a filter that lets one of them grow is
 // refused at once, before the search over all modes.
-thread_local std::vector<std::pair<double, double>> gGrowingModes;
+std::vector<std::pair<double, double>> gGrowingModes;
 
 bool Stable(const SchemeCase& c) {
     for (const auto& [a, b] : gGrowingModes)
@@ -234,10 +234,13 @@ void ReportSchemeStability() {
     WriteBlockHeading("Scheme Stability");
     WriteLine("  Courant number sqrt(g h) dt/dx in the deepest water: " + Number(courant) + " (h " +
               Number(deepest) + " m, dx/h " + Number(spacing / deepest) + ")");
+    // The depths looked at, with the growth of their fastest mode.
+    std::vector<std::pair<double, double>> growths;
     SchemeGrowth worst;
     double worstDepth = deepest;
     for (double h = deepest; h >= floor * 0.999; h /= 1.5) {
         const SchemeGrowth growth = LargestGrowth(ModelCase(h));
+        growths.emplace_back(h, growth.rate);
         if (growth.rate > worst.rate) worst = growth, worstDepth = h;
     }
     const double steps = std::max(1, g.timeStepCount);
@@ -247,9 +250,9 @@ void ReportSchemeStability() {
     if (grows) {
         // The step and the filter that leave no mode growing at any depth.
         double dt = g.dt, filter = 0.0;
-        for (double h = deepest; h >= floor * 0.999; h /= 1.5) {
+        for (const auto& [h, rate] : growths) {
+            if (rate <= kNoGrowth) continue;
             const SchemeCase c = ModelCase(h);
-            if (SchemeStable(c)) continue;
             dt = std::min(dt, StableTimeStep(c));
             const double f = StableFilter(c);
             filter = (f < 0.0 || filter < 0.0) ? -1.0 : std::max(filter, f);

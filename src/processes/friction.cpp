@@ -5,6 +5,7 @@
 // prescribed field, or the coefficient of the Smagorinsky-type field.
 #include "processes/friction.hpp"
 
+#include <algorithm>
 #include <cmath>
 #include <new>
 
@@ -99,5 +100,55 @@ void SetupEddyViscosity(KvtHandle target) {
         if (twoD) ReadGridFile2D(e.fileName, ref.Item(), field.data(), ModelGrid());
     } else {
         StopRun("_EddyViscocity: Wrong type of format");
+    }
+}
+
+// The Smagorinsky field nu/h = sqrt(S12^2/2 + Sxx^2 + Syy^2) dx^2 C^2 / h at
+// the inner points of the x chains, from the velocities the fluxes give. A
+// neighbour row or column on land is replaced by the point's own, so the
+// strain across a wall is taken as one-sided. The edges copy their inner
+// neighbours. Only dx enters the length scale.
+void CalcEddyViscosity() {
+    const GridState& g = gGrid;
+    const ChainTables& c = gChains;
+    EddySettings& e = gEddy;
+    const size_t stride = g.Stride();
+    const float* P = g.P.data();
+    const float* Q = g.Q.data();
+    const float* h = g.depth.data();
+    const float* C = e.smagorinskyCoef.data();
+    float* nu = e.eddyViscosity.data();
+    const float dx = g.dx, dy = g.dy;
+    for (int32_t k = 1; k <= g.K - 1; ++k) {
+        for (int32_t n = 1; n <= c.chainCountX[k]; ++n) {
+            const ChainPair& chain = c.X(k, n);
+            const int32_t j1 = std::max(chain.first, 1), j2 = std::min(chain.last, g.J - 1);
+            for (int32_t j = j1; j <= j2; ++j) {
+                const size_t p = g.At(j, k);
+                const float sxx = (P[p] - P[p - 1]) / (dx * h[p]);
+                const float syy = (Q[p] - Q[p - stride]) / (dy * h[p]);
+                const int32_t code = c.codeX[p];
+                const size_t pn = code == 4 || code == 2 ? p + stride : p;
+                const size_t ps = code == 4 || code == 3 ? p - stride : p;
+                const float pN = (P[pn - 1] + P[pn]) / h[pn];
+                const float pS = (P[ps - 1] + P[ps]) / h[ps];
+                const size_t pe = c.codeY[p + 1] < 0 ? p : p + 1;
+                const size_t pw = c.codeY[p - 1] < 0 ? p : p - 1;
+                const float qE = (Q[pe] + Q[pe - stride]) / h[pe];
+                const float qW = (Q[pw] + Q[pw - stride]) / h[pw];
+                const float s12 = (pN - pS) / (4.0f * dy) + (qE - qW) / (4.0f * dx);
+                nu[p] = std::sqrt(0.5f * s12 * s12 + sxx * sxx + syy * syy) * dx * dx * C[p] *
+                        C[p] / h[p];
+            }
+        }
+    }
+    if (g.J < 1 || g.K < 1) return;
+    for (int32_t j = 1; j <= g.J - 1; ++j) {
+        nu[g.At(j, 0)] = nu[g.At(j, 1)];
+        nu[g.At(j, g.K)] = nu[g.At(j, g.K - 1)];
+    }
+    for (int32_t k = 0; k <= g.K; ++k) {
+        nu[g.At(0, k)] = nu[g.At(1, k)];
+        nu[g.At(g.J, k)] = nu[g.At(g.J - 1, k)];
     }
 }

@@ -38,6 +38,9 @@ extern EddySettings gEddy;
 
 void SetupBottomFriction(KvtHandle target);
 void SetupEddyViscosity(KvtHandle target);
+// The Smagorinsky field from the strain of the flow, once a step before the
+// x-sweep with eddyType 2; stored divided by the depth.
+void CalcEddyViscosity();
 // The friction coefficient F at point (j,k): 0, the constant or the map's value.
 inline float FrictionCoefficientAt(size_t point) {
     if (gFriction.resistanceType == 1) return gFriction.frictionConstant;

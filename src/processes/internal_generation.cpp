@@ -79,10 +79,15 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
         fileStart = SecondsBetween(g.start, date);
     if (f.startOffset != static_cast<double>(kDeleteValue)) fileStart += f.startOffset;
     l.fileStep = f.timeStep;
+    // The last half step of the run asks for the end of step Time_step_count,
+    // so the file must reach that far; a file that stops short is refused
+    // here rather than running out in the middle of the run.
     const int32_t records = std::max(f.noTimeSteps, 0);
     const double fileEnd = fileStart + (records - 1) * l.fileStep;
-    if (records < 1 || fileStart > 0.0 || fileEnd < g.lastStep * g.dt)
+    const double runEnd = g.timeStepCount * g.dt;
+    if (records < 1 || fileStart > 0.0 || fileEnd < runEnd)
         StopRun("XOL data does not cover the simulation period");
+    l.records = records;
 
     const size_t points = static_cast<size_t>(r.pointCount) + 1;
     try {
@@ -111,6 +116,29 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
         l.deepNewer = l.deepOlder;
     }
     l.olderTime = fileStart + before * l.fileStep;
+    l.read = std::min(before + 2, records);
+}
+
+// Moves the file's window forward when t (seconds from the start) has passed
+// the newer record, one record per call, and interpolates both items at t
+// into the line buffers. The window stays at the file's end if t overshoots
+// it by rounding.
+void AdvanceInternalLineFile(InternalLineFile& l, int32_t points, double t) {
+    GenerationState& s = gGeneration;
+    const bool deep = gEquation.deepWaterTerms;
+    if (t > l.olderTime + l.fileStep && l.read < l.records) {
+        std::swap(l.older, l.newer);
+        std::swap(l.deepOlder, l.deepNewer);
+        l.olderTime += l.fileStep;
+        ReadLineRecord(l, l.newer, l.deepNewer);
+        ++l.read;
+    }
+    const double w = l.fileStep > 0.0 ? (t - l.olderTime) / l.fileStep : 0.0;
+    for (int32_t p = 0; p < points; ++p) {
+        s.lineValues[p] = static_cast<float>(l.older[p] * (1.0 - w) + l.newer[p] * w);
+        s.deepValues[p] =
+            deep ? static_cast<float>(l.deepOlder[p] * (1.0 - w) + l.deepNewer[p] * w) : 0.0f;
+    }
 }
 
 void ReadRecord(KvtHandle parent, int32_t number, InternalGenRecord& r) {
@@ -269,4 +297,61 @@ void SetupInternalGeneration(KvtHandle target) {
     s.genJ2 = g.J;
     s.genK1 = 0;
     s.genK2 = g.K;
+}
+
+void UpdateInternalGeneration(int32_t step, int32_t axis) {
+    GenerationState& s = gGeneration;
+    const GridState& g = gGrid;
+    const bool deep = gEquation.deepWaterTerms;
+    std::vector<float>& now = axis == 1 ? s.sourceP : s.sourceQ;
+    std::vector<float>& prev = axis == 1 ? s.sourcePPrev : s.sourceQPrev;
+    std::vector<float>& prev2 = axis == 1 ? s.sourcePPrev2 : s.sourceQPrev2;
+    // prev2 := prev, prev := now, now := 0, without copying.
+    prev2.swap(prev);
+    prev.swap(now);
+    std::fill(now.begin(), now.end(), 0.0f);
+    if (deep) {
+        std::fill(s.sourceXiX.begin(), s.sourceXiX.end(), 0.0f);
+        std::fill(s.sourceXiY.begin(), s.sourceXiY.end(), 0.0f);
+    }
+    // The x half takes the middle of the step, the y half its end.
+    const float time = axis == 1 ? static_cast<float>(step) - 0.5f : static_cast<float>(step);
+    for (int32_t r = 0; r < s.numberOfRecords; ++r) {
+        InternalGenRecord& rec = s.records[r];
+        const int32_t points = rec.pointCount + 1;
+        if (rec.waveType == 0) {
+            if (axis == 1) {
+                const float L = TsValue(rec.seriesId);
+                rec.lineHalf = (rec.lineHalf + L) * 0.5f;
+                rec.lineNew = L;
+                if (deep) {
+                    const float D = TsValue(rec.deepSeriesId);
+                    rec.deepHalf = (rec.deepHalf + D) * 0.5f;
+                    rec.deepNew = D;
+                }
+            } else {
+                rec.lineHalf = rec.lineNew;
+                rec.deepHalf = rec.deepNew;
+            }
+            std::fill(s.lineValues.begin(), s.lineValues.begin() + points, rec.lineHalf);
+            std::fill(s.deepValues.begin(), s.deepValues.begin() + points,
+                      deep ? rec.deepHalf : 0.0f);
+        } else {
+            AdvanceInternalLineFile(s.lineFiles[r], points, static_cast<double>(time) * g.dt);
+        }
+        const int32_t kind = LineKind(rec);
+        for (int32_t p = 0; p < points; ++p) {
+            const int32_t j = rec.pointJ[p], k = rec.pointK[p];
+            const int32_t i = s.sourceIndex[g.At(j, k)];
+            if (kind == 1) {
+                const int32_t i2 = s.sourceIndex[g.At(j + 1, k)];
+                if (axis == 1) s.sourceP[i] = s.sourceP[i2] = s.lineValues[p];
+                if (deep) s.sourceXiX[i] = s.sourceXiX[i2] = s.deepValues[p];
+            } else if (kind == 2) {
+                const int32_t i2 = s.sourceIndex[g.At(j, k + 1)];
+                if (axis == 2) s.sourceQ[i] = s.sourceQ[i2] = s.lineValues[p];
+                if (deep) s.sourceXiY[i] = s.sourceXiY[i2] = s.deepValues[p];
+            }
+        }
+    }
 }

@@ -31,6 +31,8 @@ struct InternalLineFile {
     std::vector<float> deepOlder, deepNewer;  // item 2, with Deep_Water_Terms only
     double olderTime = 0.0;  // seconds from the simulation start of the older record
     double fileStep = 0.0;   // seconds between the file's records
+    int32_t records = 0;     // records in the file
+    int32_t read = 0;        // records read so far
 };
 
 struct GenerationState {
@@ -49,6 +51,10 @@ struct GenerationState {
 extern GenerationState gGeneration;
 
 void SetupInternalGeneration(KvtHandle target);
+// The source values of step n for the half step of the axis (1 before the
+// x half, 2 before the y half): the vectors of that direction shift back a
+// level, and the lines get the value of the middle (x) or end (y) of the step.
+void UpdateInternalGeneration(int32_t step, int32_t axis);
 // The kind of a record's line from its ends: 1 along k (or a single point),
 // feeding x; 2 along j, feeding y; 3 oblique, feeding nothing.
 int32_t LineKind(const InternalGenRecord& record);

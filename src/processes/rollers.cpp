@@ -64,3 +64,7 @@ void SetupWaveBreaking(KvtHandle target) {
         r.tanPhi[p] = r.tanPhiOld[p] = static_cast<float>(r.tanInitial);
     }
 }
+
+// Placeholder until the roller passes land; the model reader still refuses
+// rollers, so nothing reaches this.
+void CalcBreaking(const float* /*xiExt*/, int32_t /*axis*/) {}

@@ -28,3 +28,8 @@ struct RollerSettings {
 extern RollerSettings gRollers;
 
 void SetupWaveBreaking(KvtHandle target);
+// Renews the roller fields before each sweep: axis 1 before the x-sweep, 2
+// before the y-sweep, after the depth of the estimated surface and before
+// the shift of the surface levels, so that xi is the level just reached,
+// xiPrev half a step and xiPrev2 a whole step older. xiExt is not used.
+void CalcBreaking(const float* xiExt, int32_t axis);

@@ -3,9 +3,12 @@
 #include <omp.h>
 
 #include "output/deterministic.hpp"
+#include "output/hotstart.hpp"
+#include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
 #include "processes/porosity.hpp"
+#include "processes/rollers.hpp"
 #include "processes/shoreline.hpp"
 #include "processes/sponge.hpp"
 #include "data/tsfunc.hpp"
@@ -33,19 +36,23 @@ void StopLoopTasks() {
     StopTiming(gOverallTiming, kTaskCalculation);
 }
 
-// One half of a step: the surface estimate for the sweep, its boundary
-// values and depth, the shift of the surface levels, the sweep, and the
-// damping behind it.
+// One half of a step: the source values of internal generation, the surface
+// estimate for the sweep, its boundary values and depth, the rollers, the
+// shift of the surface levels, the sweep, and the damping behind it.
 void HalfStep(int32_t axis, int32_t step) {
     GridState& g = gGrid;
     float* xiExt = axis == 1 ? g.xiExtX.data() : g.xiExtY.data();
     float* depthExt = axis == 1 ? g.depthExtX.data() : g.depthExtY.data();
+    if (gGeneration.numberOfRecords > 0) UpdateInternalGeneration(step, axis);
     if (axis == 1)
         ExtrapolateSurfaceElevationX(xiExt);
     else
         ExtrapolateSurfaceElevationY(xiExt);
     SetBoundarySurface(axis, xiExt);
     CalculateDepth(g.J, g.K, depthExt, g.bed.data(), xiExt);
+    // The rollers see xi as the level just reached, xiPrev half a step and
+    // xiPrev2 a whole step older: before the shift.
+    if (gRollers.type == 1) CalcBreaking(xiExt, axis);
     ShiftSurfaceLevels();
 
     const int task = axis == 1 ? kTaskXSweep : kTaskYSweep;
@@ -187,6 +194,7 @@ void PrepareTimeLoop() {
 void ComputeStep(int32_t n) {
     TsReadStep(n);
     UpdateBoundaryData(n);
+    if (gEddy.eddyType == 2) CalcEddyViscosity();
     HalfStep(1, n);
     HalfStep(2, n);
     if (gEquation.gridScaleFilter > 0.0f) {
@@ -202,6 +210,7 @@ void Compute(int& exitCode) {
 
     PrepareTimeLoop();
     CreateOutputDeterministic();
+    if (gHotstartOutput.hotStart) WriteOutputHotstart(0);
     StartProgress(1, g.timeStepCount, exitCode);
     if (exitCode < 0) {
         StopTiming(gOverallTiming, kTaskPreProcessing);
@@ -224,6 +233,7 @@ void Compute(int& exitCode) {
         StopLoopTasks();
         StartTiming(gOverallTiming, kTaskPostProcessing);
         WriteOutputDeterministic(n);
+        if (gHotstartOutput.hotStart) WriteOutputHotstart(n);
         StopTiming(gOverallTiming, kTaskPostProcessing);
         StartLoopTasks();
 

@@ -104,12 +104,6 @@ void ReadOptionParameters(KvtHandle target) {
 // run yet end the run here, after the whole file has been read, so that the
 // log holds every setting and nothing runs half.
 void StopOnUnavailable() {
-    if (gRollers.type == 1)
-        StopRun("Wave breaking by surface rollers is not yet available in this version");
-    if (gEddy.eddyType == 2)
-        StopRun("Eddy viscosity of the Smagorinsky type is not yet available in this version");
-    if (gGeneration.numberOfRecords > 0)
-        StopRun("Internal wave generation is not yet available in this version");
     if (const char* name = UnavailableOutput())
         StopRun(std::string(name) + " is not yet available in this version");
 }

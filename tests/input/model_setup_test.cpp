@@ -118,15 +118,6 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
          "SetupInternalGeneration: the deep water terms need two items in the series"},
         {{{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}},
          "The 1DH mesh solver is not yet available in this version"},
-        {{{"WAVE_BREAKING", "type = 1\n"}},
-         "Wave breaking by surface rollers is not yet available in this version",
-         {all, "    direction : 270 (default)\n"}},
-        {{{"EDDY_VISCOSITY", "Type = 1\nFormulation = 1\nBase = 1\nConstant_Value = 0.2\n"}},
-         "Eddy viscosity of the Smagorinsky type is not yet available in this version",
-         {all}},
-        {{{"Internal_Generation", generation}},
-         "Internal wave generation is not yet available in this version",
-         {all}},
     };
     for (const auto& c : cases) {
         const bwtest::RunResult r = Run(c.sections);

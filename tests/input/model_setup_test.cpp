@@ -84,9 +84,6 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
         "Last_Line_Pos = 2, 4\nWave_Type = 0\n" +
         bwtest::DataFileSection("gen.xol0") + "}\n";
     const std::string deep = "Deep_Water_Terms = true\nDispersion_Factor = ";
-    // What the 2DH solver of this version cannot run stops only once all is
-    // read (the last section is in the log), the keys behind the type among it.
-    const char* all = "Section: OPTION_PARAMETERS";
     const struct {
         Sections sections;
         const char* message;

@@ -91,7 +91,7 @@ void SetupOutputDisturbance2D(KvtHandle target) {
 void SetupOutputHotstart2D(KvtHandle target) {
     HotstartOutputSettings& h = gHotstartOutput;
     h = HotstartOutputSettings{};
-    h.firstStep = h.lastStep = h.stepInterval = gGrid.lastStep;
+    h.firstStep = h.lastStep = h.stepInterval = gGrid.timeStepCount;
     const KvtHandle section = KvtOpenSection(target, "Output_Hotstart_2D");
     KvtGetLogical(section, "Hot_Start", h.hotStart);
     if (!h.hotStart) return;
@@ -105,6 +105,5 @@ void SetupOutputHotstart2D(KvtHandle target) {
 const char* UnavailableOutput() {
     if (gStatisticOutput.type > 0) return "Wave statistics output";
     if (gDisturbanceOutput.type > 0) return "Wave disturbance output";
-    if (gHotstartOutput.hotStart) return "Hot-start output";
     return nullptr;
 }

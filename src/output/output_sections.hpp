@@ -46,7 +46,7 @@ extern DisturbanceSettings gDisturbanceOutput;
 struct HotstartOutputSettings {
     bool hotStart = false;
     std::string title, fileName;
-    int32_t firstStep = 0, lastStep = 0, stepInterval = 0;  // defaults: the last step index
+    int32_t firstStep = 0, lastStep = 0, stepInterval = 0;  // defaults: the run's last step
 };
 extern HotstartOutputSettings gHotstartOutput;
 

@@ -200,8 +200,6 @@ TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
          "Wave statistics output is not yet available in this version"},
         {"Output_Disturbance_2D", "Type = 1\nTime_Step_Interval = 10\n",
          "Wave disturbance output is not yet available in this version"},
-        {"Output_Hotstart_2D", "Hot_Start = true\n",
-         "Hot-start output is not yet available in this version"},
     };
     for (const auto& c : cases) {
         const bwtest::RunResult r = Run({{c.section, c.body}});

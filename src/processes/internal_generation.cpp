@@ -81,11 +81,15 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
     l.fileStep = f.timeStep;
     // The last half step of the run asks for the end of step Time_step_count,
     // so the file must reach that far; a file that stops short is refused
-    // here rather than running out in the middle of the run.
+    // here rather than running out in the middle of the run. A file may end
+    // exactly there: the tolerance takes up the rounding of the two sums of
+    // steps (33 steps of 0.1 s pass 11 steps of 0.3 s by 4e-16 s).
     const int32_t records = std::max(f.noTimeSteps, 0);
     const double fileEnd = fileStart + (records - 1) * l.fileStep;
     const double runEnd = g.timeStepCount * g.dt;
-    if (records < 1 || fileStart > 0.0 || fileEnd < runEnd)
+    const double eps = 1e-6 * std::max(g.dt, 1e-3);
+    if (records < 1 || fileStart > eps || fileEnd < runEnd - eps ||
+        (records > 1 && l.fileStep <= 0.0))
         StopRun("XOL data does not cover the simulation period");
     l.records = records;
 
@@ -101,9 +105,11 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
         StopRun("Unable to allocate memory");
     }
     // The whole file steps before the start are passed over; the last of
-    // them is the older record, the next the newer one.
+    // them is the older record, the next the newer one. A file that starts
+    // within the tolerance after the start passes nothing over.
     const int32_t before =
-        l.fileStep > 0.0 ? static_cast<int32_t>(std::floor(-fileStart / l.fileStep)) : 0;
+        l.fileStep > 0.0 ? std::max(static_cast<int32_t>(std::floor(-fileStart / l.fileStep)), 0)
+                         : 0;
     for (int32_t m = 0; m < before; ++m) {
         XolSkipDynamic(f);
         XolSkipDynamic(f);

@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <sstream>
 
+#include "data/tsfunc.hpp"
 #include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
 #include "solver2d/model_state.hpp"
@@ -64,7 +65,27 @@ protected:
         SetupInternalGeneration(KvtOpenTarget(file, "TARNEL_BOUSSINESQ_WAVE"));
         kvtClose(&file);
     }
+    // Sets up generation from the records given as the body of the section.
+    void SetupText(const std::string& records, int count) {
+        bwtest::WriteFile(dir / "m.bw",
+                          "TARNEL_BOUSSINESQ_WAVE {\nInternal_Generation {\nNumber_Of_Records = " +
+                              std::to_string(count) + "\n" + records + "}\n}\n");
+        KvtHandle file = KvtOpenFile(dir / "m.bw", false);
+        SetupInternalGeneration(KvtOpenTarget(file, "TARNEL_BOUSSINESQ_WAVE"));
+        kvtClose(&file);
+    }
+    static std::string Record(int n, int j1, int k1, int j2, int k2, int waveType,
+                              const std::string& file, int items) {
+        return "INTERNAL_GEN_DATA_" + std::to_string(n) +
+               " {\nFirst_Line_Pos = " + std::to_string(j1) + ", " + std::to_string(k1) +
+               "\nLast_Line_Pos = " + std::to_string(j2) + ", " + std::to_string(k2) +
+               "\nWave_Type = " + std::to_string(waveType) + "\nDATA_FILE {\nFile_name = file(\"" +
+               file + "\")" + "\nItem_Count = " + std::to_string(items) +
+               "\nItem_Numbers = 1, 2\n}\n}\n";
+    }
     int32_t Number(int32_t j, int32_t k) { return gGeneration.sourceIndex[gGrid.At(j, k)]; }
+    float P(int32_t j, int32_t k) { return gGeneration.sourceP[Number(j, k)]; }
+    float Q(int32_t j, int32_t k) { return gGeneration.sourceQ[Number(j, k)]; }
 };
 
 TEST_F(Generation, EveryKindOfLineNumbersItsPointsAndNeighboursAndReadsItsFile) {
@@ -102,10 +123,103 @@ TEST_F(Generation, WrongLineFilesStopTheRun) {
                 "XOL data does not have the correct number of grid points \\(x.dir.\\)");
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 4, 1}}), testing::ExitedWithCode(1),
                 "XOL data does not contain the correct number of items");
-    // The run lasts 4.5 s; a file of 4 records a second from the start ends at 3 s.
-    EXPECT_EXIT(Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 1.0, 4),
+    // A series where a line file belongs.
+    bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0,
+                            {std::vector<float>(10, 0.0f), std::vector<float>(10, 0.0f)});
+    EXPECT_EXIT(SetupText(Record(1, 10, 5, 10, 8, 1, "series.xol0", 2), 1),
+                testing::ExitedWithCode(1), "XOL data is not 1D");
+    // The y half of the last of the 10 steps of 0.5 s asks for 5 s: a file
+    // of records every 0.5 s from the start must have 11 of them, and one
+    // that starts a second late does not cover the start.
+    EXPECT_EXIT(Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.5, 10),
+                testing::ExitedWithCode(1), "XOL data does not cover the simulation period");
+    EXPECT_EXIT(Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:01", 0.5, 20),
                 testing::ExitedWithCode(1), "XOL data does not cover the simulation period");
     unsetenv("TRF");
+}
+
+TEST_F(Generation, AFileThatReachesTheEndOfTheLastStepIsTaken) {
+    Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.5, 11);
+    EXPECT_EQ(gGeneration.lineFiles[0].records, 11);
+    TearDown();
+    // 33 steps of 0.1 s against 11 steps of 0.3 s: the sums differ in the
+    // last bit (3.3000000000000003 against 3.3), and the file still covers
+    // the run.
+    gGrid.dt = 0.1, gGrid.timeStepCount = 33;
+    Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.3, 12);
+    EXPECT_EQ(gGeneration.lineFiles[0].records, 12);
+}
+
+TEST_F(Generation, TheUpdateFeedsEachKindOfLineAtTheMiddleAndTheEndOfTheStep) {
+    // A line along k fed by a constant series (0.4, deep item 4), a line
+    // along j given high end first and fed by a file whose value grows with
+    // time and along the line (record n, point s: n + 0.1 s; deep item ten
+    // times that, one record a second, the step is 0.5 s), and an oblique
+    // line fed by the same kind of file.
+    gEquation.deepWaterTerms = true;
+    TsReset();
+    TsInit(gGrid.timeStepCount + 1);
+    bwtest::WriteSeriesFile(dir / "c.xol0", "2004-01-01 00:00:00", 0.5,
+                            {std::vector<float>(11, 0.4f), std::vector<float>(11, 4.0f)});
+    auto lineFile = [&](const std::string& name, int points) {
+        std::vector<std::vector<std::vector<float>>> items(2);
+        for (int n = 0; n < 6; ++n) {
+            std::vector<float> v(points);
+            for (int s = 0; s < points; ++s) v[s] = n + 0.1f * s;
+            items[0].push_back(v);
+            for (float& x : v) x *= 10.0f;
+            items[1].push_back(v);
+        }
+        bwtest::WriteLineFile(dir / name, "2004-01-01 00:00:00", 1.0, 1.0f, items);
+    };
+    lineFile("down.xol1", 4);
+    lineFile("oblique.xol1", 11);
+    SetupText(Record(1, 2, 2, 2, 4, 0, "c.xol0", 2) + Record(2, 8, 3, 5, 3, 1, "down.xol1", 2) +
+                  Record(3, 15, 5, 25, 10, 1, "oblique.xol1", 2),
+              3);
+    const GenerationState& g = gGeneration;
+    auto obliqueIsEmpty = [&] {
+        for (int32_t i = 15; i <= g.sourceCount; ++i)
+            if (g.sourceP[i] != 0.0f || g.sourceQ[i] != 0.0f) return false;
+        return true;
+    };
+    // Step 1: the series gives half its value at the x half and all of it
+    // at the y half; the file is read at 0.5 s for the y half, point s = 0
+    // being the high end (8,3), and both rows of the line take the value.
+    TsReadStep(1);
+    UpdateInternalGeneration(1, 1);
+    EXPECT_FLOAT_EQ(P(2, 2), 0.2f);
+    EXPECT_FLOAT_EQ(P(3, 4), 0.2f);
+    EXPECT_EQ(Q(8, 3), 0.0f);
+    // The deep items feed every half step, each line its own direction.
+    EXPECT_FLOAT_EQ(g.sourceXiX[Number(2, 3)], 2.0f);
+    EXPECT_FLOAT_EQ(g.sourceXiY[Number(8, 3)], 2.5f);
+    EXPECT_EQ(g.sourceXiY[Number(2, 3)], 0.0f);
+    EXPECT_EQ(g.sourceXiX[Number(8, 3)], 0.0f);
+    UpdateInternalGeneration(1, 2);
+    EXPECT_FLOAT_EQ(P(2, 2), 0.2f);  // x keeps its value through the y half
+    EXPECT_FLOAT_EQ(g.sourceXiX[Number(2, 3)], 4.0f);
+    EXPECT_FLOAT_EQ(Q(8, 3), 0.5f);
+    EXPECT_FLOAT_EQ(Q(8, 4), 0.5f);
+    EXPECT_FLOAT_EQ(Q(5, 3), 0.8f);
+    EXPECT_FLOAT_EQ(Q(5, 4), 0.8f);
+    EXPECT_FLOAT_EQ(g.sourceXiY[Number(6, 4)], 7.0f);
+    EXPECT_EQ(Q(2, 2), 0.0f);  // a line along k never feeds y
+    EXPECT_TRUE(obliqueIsEmpty());
+    // Steps 2 and 3: the series stands at its value; the file passes its
+    // second record at 1 s and is interpolated beyond it; the levels shift.
+    for (int32_t n = 2; n <= 3; ++n) {
+        TsReadStep(n);
+        UpdateInternalGeneration(n, 1);
+        UpdateInternalGeneration(n, 2);
+    }
+    EXPECT_FLOAT_EQ(P(2, 2), 0.4f);
+    EXPECT_FLOAT_EQ(g.sourcePPrev[Number(2, 2)], 0.4f);
+    EXPECT_FLOAT_EQ(g.sourcePPrev2[Number(2, 2)], 0.2f);
+    EXPECT_FLOAT_EQ(Q(7, 3), 1.6f);
+    EXPECT_FLOAT_EQ(g.sourceQPrev[Number(7, 3)], 1.1f);
+    EXPECT_FLOAT_EQ(g.sourceQPrev2[Number(7, 3)], 0.6f);
+    EXPECT_TRUE(obliqueIsEmpty());
 }
 
 }  // namespace

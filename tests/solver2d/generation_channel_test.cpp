@@ -11,12 +11,12 @@
 // carried at the celerity.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
 #include <complex>
 #include <numbers>
 #include <sstream>
 
-#include "data/tsfunc.hpp"
 #include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
 #include "processes/internal_generation.hpp"

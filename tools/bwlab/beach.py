@@ -256,7 +256,7 @@ def analyse(a, nx):
     x = np.arange(nx) * a.dx - a.flat
     height = heights.mean(axis=0)
     mean = xi.mean(axis=0)
-    return x, height, mean, float(np.ma.max(delta))
+    return x, height, mean, np.ma.filled(delta[-periods * n:].max(axis=0), 0.0)
 
 
 def compare(a, x, height, mean):
@@ -306,10 +306,15 @@ def run(a):
         a.height = float(measured(a.test)[1][0])
     if a.out is None:
         a.out = os.path.join(os.getcwd(), f"run-{a.test}")
-    nx, dt, steps = build(a)
-    bw = os.path.join(a.bin, "src", "bw")
-    env = dict(os.environ, OMP_NUM_THREADS=str(a.threads))
-    r = subprocess.run([bw, "beach.bw"], cwd=a.out, env=env, capture_output=True, text=True)
+    if a.reanalyse:  # the files of an earlier run
+        nx = int(open(os.path.join(a.out, "beach.bw")).read().split("X_Range_And_Interval = 0, ")[1]
+                 .split(",")[0]) + 1
+        r = subprocess.CompletedProcess([], 0)
+    else:
+        nx, dt, steps = build(a)
+        bw = os.path.join(a.bin, "src", "bw")
+        env = dict(os.environ, OMP_NUM_THREADS=str(a.threads))
+        r = subprocess.run([bw, "beach.bw"], cwd=a.out, env=env, capture_output=True, text=True)
     if r.returncode != 0:
         tail = "\n".join((r.stdout + r.stderr).splitlines()[-5:])
         result = {"test": a.test, "dx": a.dx, "steps_per_period": a.steps_per_period,
@@ -320,12 +325,18 @@ def run(a):
             json.dump(result, f, indent=1)
         return 1
     x, height, mean, dmax = analyse(a, nx)
+    # Where breaking starts: the first point on the slope whose roller grows
+    # thicker than 1 mm in the periods kept.
+    onset = x[(x > 0.0) & (dmax > 1e-3)]
     with open(os.path.join(a.out, "profile.csv"), "w") as f:
         f.write("x_m,wave_height_m,mean_level_m\n")
         for p, h, m in zip(x, np.ma.filled(height, np.nan), np.ma.filled(mean, np.nan)):
             f.write(f"{p:.4f},{h:.6f},{m:.6f}\n")
     result = compare(a, x, height, mean)
-    result["roller_thickness_max"] = dmax
+    result["roller_thickness_max"] = float(dmax.max())
+    if onset.size:
+        result["onset_x_model"] = float(onset[0])
+        result["onset_error"] = (float(onset[0]) - result["break_x_measured"]) / result["break_x_measured"]
     with open(os.path.join(a.out, "result.json"), "w") as f:
         json.dump(result, f, indent=1)
     short = {k: v for k, v in result.items() if not k.endswith("_points")}
@@ -334,20 +345,23 @@ def run(a):
 
 
 def table(dirs):
-    print("| run | dx | T/dt | Cr | breaking x (meas) | error | H surf mean/max | set-up mean/max |")
-    print("|---|---|---|---|---|---|---|---|")
+    print("| run | dx (m) | T/dt | Cr | rollers from x (m) | error | H peak at x (m) | "
+          "H surf zone, mean / max error | set-up, mean / max error |")
+    print("|---|---|---|---|---|---|---|---|---|")
     for d in dirs:
         with open(os.path.join(d, "result.json")) as f:
             r = json.load(f)
         name = os.path.basename(os.path.normpath(d))
         if "failed" in r:
-            print(f"| {name} | {r['dx']} | {r['steps_per_period']} | | {r['failed'][:60]} |||")
+            print(f"| {name} | {r['dx']} | {r['steps_per_period']} | | "
+                  f"{r['failed'].splitlines()[-1][:60]} |||||")
             continue
         su = (f"{100 * r['setup_error_mean']:.0f} / {100 * r['setup_error_max']:.0f} %"
               if r["setup_error_mean"] is not None else "-")
         print(f"| {name} | {r['dx']} | {r['steps_per_period']} | {r['courant']:.2f} | "
-              f"{r['break_x_model']:.2f} ({r['break_x_measured']:.2f}) | "
-              f"{100 * r['break_error']:+.1f} % | "
+              f"{r.get('onset_x_model', float('nan')):.2f} | "
+              f"{100 * r.get('onset_error', float('nan')):+.1f} % | "
+              f"{r['break_x_model']:.2f} | "
               f"{100 * r['surf_height_error_mean']:.0f} / {100 * r['surf_height_error_max']:.0f} % | "
               f"{su} |")
 
@@ -407,6 +421,7 @@ def main(argv=None):
     r.add_argument("--threads", type=int, default=1)
     r.add_argument("--bin", default=os.path.join(ROOT, "build", "release"))
     r.add_argument("--out")
+    r.add_argument("--reanalyse", action="store_true", help="compare the files of a run again")
     c = sub.add_parser("compare")
     c.add_argument("dirs", nargs="+")
     g = sub.add_parser("plot")

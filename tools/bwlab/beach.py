@@ -8,13 +8,15 @@ The flume: 0.36 m of still water over a flat bed, then a plane slope of
 1:34.3 from the toe (x = 0) up past the still water line (x = 12.35 m).
 The model is a channel of a few water rows between walls, waves from a
 level boundary at the west end (a sine of the measured height at the toe,
-ramped up over the warm-up), the flat part FLAT metres long, the moving
-shoreline on the beach, the default surface rollers. The surface and the
+ramped up over the warm-up), the flat part FLAT metres long, the slope
+ending at a wall in 3 cm of water behind a sponge (--shore wall), or running
+up past the waterline with the moving shoreline (--shore slot), the default
+surface rollers. The surface and the
 roller thickness along the middle row are written every step of the last
 periods; wave height is the mean crest-to-trough height of those periods,
 the mean level their time mean.
 
-    beach.py run 031041 [--dx 0.025] [--steps-per-period 128] [--periods 30]
+    beach.py run 031041 [--dx 0.025] [--steps-per-period 128] [--periods 30] [--shore wall]
                         [--set WAVE_BREAKING.roller_factor=3 ...] [--out DIR]
     beach.py compare DIR ...   (the table of several finished runs)
 
@@ -408,7 +410,7 @@ def main(argv=None):
     r.add_argument("--record-periods", type=int, default=6)
     r.add_argument("--rows", type=int, default=3)
     r.add_argument("--flat", type=float, default=6.0, help="m of flat bed before the toe")
-    r.add_argument("--shore", choices=["slot", "wall"], default="slot",
+    r.add_argument("--shore", choices=["slot", "wall"], default="wall",
                    help="slot: the moving shoreline up the beach; wall: a wall in shallow water")
     r.add_argument("--beach-top", type=float, default=0.08, help="slot: bed level at the end, m")
     r.add_argument("--end-depth", type=float, default=0.03, help="wall: still water depth there, m")

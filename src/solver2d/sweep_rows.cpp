@@ -377,6 +377,9 @@ void FrictionRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Cha
     }
 }
 
+// Largest fraction of the depth a roller takes in its momentum flux.
+constexpr double kRollerFraction = 0.5;
+
 void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, ChainRows& w) {
     const int32_t m = last - first + 1;
     if (gRollers.type != 1 || gRollers.delta.empty()) {
@@ -387,7 +390,15 @@ void RollerRows(const AxisView& v, int32_t k, int32_t first, int32_t last, Chain
     const float* cAlong = v.cAlong;
     const float* cAcross = v.cAcross;
     const size_t up = v.across, base = v.At(first, k);
-    auto wf = [](double a, double b) { return a / (1.0 - a / b); };
+    // The roller's share of the momentum flux, delta / (1 - delta/d). At the
+    // waterline a roller may fill the whole of a shallow face (delta up to
+    // the point's depth, and the face's estimated depth may be smaller), and
+    // the share would grow without bound; it is held at twice the thickness,
+    // which leaves every roller thinner than half the depth as it is.
+    auto wf = [](double a, double b) {
+        const double r = a < kRollerFraction * b ? a / b : kRollerFraction;
+        return a / (1.0 - r);
+    };
     for (int32_t r = 1; r < m; ++r) {
         const size_t p0 = base + (r - 1) * v.along, p1 = p0 + v.along;
         const int32_t c0 = v.codeN[p0], c1 = v.codeN[p1];

@@ -96,16 +96,13 @@ struct BreakingFields {
     size_t stride;
     const float *bed, *xi, *xiPrev, *xiPrev2, *depth, *P, *PPrev, *Q, *QPrev;
     const int32_t *codeX, *codeY;
-    const float *porosity, *sponge;  // null where the field does not exist
+    const uint8_t* blocked;          // kPorousOrSponge, kSource (PrepareBreaking)
     float *tanPhi, *tanPhiOld, *delta, *deltaOld, *cx, *cxOld, *cy, *cyOld;
 };
 
 BreakingFields Fields() {
     GridState& g = gGrid;
     RollerSettings& r = gRollers;
-    auto orNull = [&](const std::vector<float>& f) {
-        return f.size() == g.Points() ? f.data() : nullptr;
-    };
     return {g.J,
             g.K,
             g.Stride(),
@@ -120,8 +117,7 @@ BreakingFields Fields() {
             g.QPrev.data(),
             gChains.codeX.data(),
             gChains.codeY.data(),
-            orNull(gPorosity.porosity),
-            orNull(gSponge.sponge),
+            r.blocked.data(),
             r.tanPhi.data(),
             r.tanPhiOld.data(),
             r.delta.data(),
@@ -135,9 +131,7 @@ BreakingFields Fields() {
 // A point carries no roller when it is dry, porous or in a sponge.
 bool CarriesRoller(const BreakingFields& f, size_t p) {
     if (static_cast<double>(f.xi[p]) - f.bed[p] <= 0.0) return false;
-    if (f.porosity && 1.0 - f.porosity[p] > 0.0001) return false;
-    if (f.sponge && static_cast<double>(f.sponge[p]) - 1.0 > 0.0001) return false;
-    return true;
+    return (f.blocked[p] & kPorousOrSponge) == 0;
 }
 
 // Pass 1: keep the old fields, then relax the critical slope where the
@@ -243,14 +237,103 @@ void CelerityAt(const BreakingFields& f, int32_t axis, int32_t j, int32_t k, siz
     }
 }
 
-// Pass 2 over the points of the x chains of rows 1..K.
+// Pass 2 of types 1 and 2 over the points j1..j2 of row k, all of them
+// inside the grid (0 < j, k < J, K): CelerityAt as one straight pass over
+// the rows k-1, k and k+1, with the values of CelerityAt to the last bit.
+// (The compiler does not vectorise it: the choices of the celerity formula
+// stay branches.)
+void CelerityRow(const BreakingFields& f, int32_t axis, int32_t k, int32_t j1, int32_t j2) {
+    const RollerSettings& r = gRollers;
+    const GridState& g = gGrid;
+    const double gravity = static_cast<double>(kGravity);
+    const double minimumDepth = r.minimumDepth, vf = r.velocityFactor, eps = r.velocityEps;
+    const double tanFinal = r.tanFinal, span = r.tanInitial - r.tanFinal;
+    const bool shared = span != 0.0, scaled = r.velocityType == 1;
+    const double dx2 = 2.0 * g.dx, dy2 = 2.0 * g.dy, dt = g.dt;
+    // Rows k-1, k and k+1 of the fields, each indexed by j, so that every
+    // load of the pass has unit stride.
+    const size_t o = static_cast<size_t>(k) * f.stride, s = o - f.stride, n = o + f.stride;
+    const float* __restrict xi = f.xi + o;
+    const float* __restrict xiS = f.xi + s;
+    const float* __restrict xiN = f.xi + n;
+    const float* __restrict xi2 = f.xiPrev2 + o;
+    const float* __restrict xi2S = f.xiPrev2 + s;
+    const float* __restrict xi2N = f.xiPrev2 + n;
+    const float* __restrict xi1 = f.xiPrev + o;
+    const float* __restrict bed = f.bed + o;
+    const float* __restrict P = f.P + o;
+    const float* __restrict Q = f.Q + o;
+    const float* __restrict QS = f.Q + s;
+    // The flux of the other axis, over its two time levels.
+    const float* __restrict Po = (axis == 1 ? f.P : f.PPrev) + o;
+    const float* __restrict Qo = (axis == 1 ? f.QPrev : f.Q) + o;
+    const float* __restrict QoS = (axis == 1 ? f.QPrev : f.Q) + s;
+    const int32_t* __restrict codeX = f.codeX + o;
+    const int32_t* __restrict codeY = f.codeY + o;
+    const uint8_t* __restrict blocked = f.blocked + o;
+    const float* __restrict tanPhi = f.tanPhi + o;
+    const float* __restrict cxOld = f.cxOld + o;
+    const float* __restrict cyOld = f.cyOld + o;
+    float* __restrict cx = f.cx + o;
+    float* __restrict cy = f.cy + o;
+    const double tiny = static_cast<double>(1e-6f);
+    for (int32_t j = j1; j <= j2; ++j) {
+        const double d = std::max(-static_cast<double>(bed[j]), minimumDepth);
+        const double c0 = std::sqrt(gravity * d);
+        const double share = shared ? (tanPhi[j] - tanFinal) / span : 0.0;
+        const double C = c0 * (vf - share * (vf - 1.0));
+        const double mC = (static_cast<double>(xi[j]) + xi2[j]) * 0.5;
+        const double mW0 = (static_cast<double>(xi[j - 1]) + xi2[j - 1]) * 0.5;
+        const double mE0 = (static_cast<double>(xi[j + 1]) + xi2[j + 1]) * 0.5;
+        const double mS0 = (static_cast<double>(xiS[j]) + xi2S[j]) * 0.5;
+        const double mN0 = (static_cast<double>(xiN[j]) + xi2N[j]) * 0.5;
+        const double mN = codeX[j] == 3 ? mC : mN0, mS = codeX[j] == 2 ? mC : mS0;
+        const double mE = codeY[j] == 3 ? mC : mE0, mW = codeY[j] == 2 ? mC : mW0;
+        const double Sx = (mE - mW) / dx2, Sy = (mN - mS) / dy2;
+        const double G = std::sqrt(Sx * Sx + Sy * Sy);
+        const double St = (static_cast<double>(xi[j]) - xi2[j]) / dt;
+        const double pTwo = (static_cast<double>(P[j]) + P[j - 1]) * 0.5;
+        const double pFour = (static_cast<double>(P[j]) + Po[j] + P[j - 1] + Po[j - 1]) * 0.25;
+        const double qTwo = (static_cast<double>(Q[j]) + QS[j]) * 0.5;
+        const double qFour = (static_cast<double>(Q[j]) + Qo[j] + QS[j] + QoS[j]) * 0.25;
+        const double Px = axis == 1 ? pTwo : pFour, Qy = axis == 1 ? qFour : qTwo;
+        const double cxo = cxOld[j], cyo = cyOld[j];
+        const double A = xi1[j];
+        const double E = A * A + G * G * d * d;
+        const bool moving = E > (d * eps) * (d * eps);
+        const double T = d * d * St, Es = moving ? E : 1.0;
+        const double vx = moving ? (A * Px - Sx * T) / Es : cxo;
+        const double vy = moving ? (A * Qy - Sy * T) / Es : cyo;
+        const double L = std::sqrt(vx * vx + vy * vy);
+        const bool still = L <= tiny;
+        const double Ls = still ? 1.0 : L;
+        const double x1 = still ? cxo : vx * C / Ls, y1 = still ? cyo : vy * C / Ls;
+        const bool off =
+            (static_cast<double>(xi[j]) - bed[j] <= 0.0) | ((blocked[j] & kPorousOrSponge) != 0);
+        const float x = static_cast<float>(scaled ? x1 : vx), y = static_cast<float>(scaled ? y1 : vy);
+        cx[j] = off ? 0.0f : x;
+        cy[j] = off ? 0.0f : y;
+    }
+}
+
+// Pass 2 over the points of the x chains of rows 1..K. Types 1 and 2 take
+// the straight pass inside the grid; the edges and the other types go point
+// by point.
 void RenewCelerity(const BreakingFields& f, int32_t axis) {
     const ChainTables& t = gChains;
+    const int32_t type = gRollers.velocityType;
+    const bool rows = type == 1 || type == 2;
 #pragma omp parallel for schedule(static)
     for (int32_t k = 1; k <= f.K; ++k) {
         for (int32_t n = 1; n <= t.chainCountX[k]; ++n) {
             const ChainPair c = t.X(k, n);
+            int32_t j1 = c.first, j2 = c.last;
+            if (rows && k < f.K) {
+                j1 = std::max(c.first, 1), j2 = std::min(c.last, f.J - 1);
+                if (j1 <= j2) CelerityRow(f, axis, k, j1, j2);
+            }
             for (int32_t j = c.first; j <= c.last; ++j) {
+                if (j >= j1 && j <= j2 && rows && k < f.K) continue;
                 const size_t p = static_cast<size_t>(k) * f.stride + j;
                 if (!CarriesRoller(f, p))
                     f.cx[p] = f.cy[p] = 0.0f;
@@ -290,21 +373,30 @@ void RenewThickness(const BreakingFields& f) {
     const ChainTables& t = gChains;
     const double dt = gGrid.dt;
     const double gain = dt * 0.5 * gRollers.rollerFactor;
+    const float* __restrict xi = f.xi;
+    const float* __restrict xi2 = f.xiPrev2;
+    const float* __restrict bed = f.bed;
+    const float* __restrict depth = f.depth;
+    const float* __restrict tanPhi = f.tanPhi;
+    const float* __restrict cxs = f.cx;
+    const float* __restrict cys = f.cy;
+    const float* __restrict deltaOld = f.deltaOld;
+    const uint8_t* __restrict blocked = f.blocked;
+    float* __restrict delta = f.delta;
 #pragma omp parallel for schedule(static)
     for (int32_t k = 1; k <= f.K; ++k) {
         for (int32_t n = 1; n <= t.chainCountX[k]; ++n) {
             const ChainPair c = t.X(k, n);
-            for (int32_t j = c.first; j <= c.last; ++j) {
-                const size_t p = static_cast<size_t>(k) * f.stride + j;
-                if (!CarriesRoller(f, p) || SourceAt(p) > 0) {
-                    f.delta[p] = 0.0f;
-                    continue;
-                }
-                const double cx = f.cx[p], cy = f.cy[p];
-                const double rise = (static_cast<double>(f.xi[p]) - f.xiPrev2[p]) / dt;
+            const size_t o = static_cast<size_t>(k) * f.stride;
+#pragma GCC ivdep
+            for (size_t p = o + c.first; p <= o + c.last; ++p) {
+                const double cx = cxs[p], cy = cys[p];
+                const double rise = (static_cast<double>(xi[p]) - xi2[p]) / dt;
                 const double v =
-                    f.deltaOld[p] + (rise - f.tanPhi[p] * std::sqrt(cx * cx + cy * cy)) * gain;
-                f.delta[p] = static_cast<float>(std::min(std::max(v, 0.0), double{f.depth[p]}));
+                    deltaOld[p] + (rise - tanPhi[p] * std::sqrt(cx * cx + cy * cy)) * gain;
+                const float kept = static_cast<float>(std::min(std::max(v, 0.0), double{depth[p]}));
+                const bool off = (static_cast<double>(xi[p]) - bed[p] <= 0.0) | (blocked[p] != 0);
+                delta[p] = off ? 0.0f : kept;
             }
         }
     }
@@ -312,7 +404,26 @@ void RenewThickness(const BreakingFields& f) {
 
 }  // namespace
 
+void PrepareBreaking() {
+    RollerSettings& r = gRollers;
+    const GridState& g = gGrid;
+    const size_t n = g.Points();
+    try {
+        r.blocked.assign(n, 0);
+    } catch (const std::bad_alloc&) {
+        StopRun("Unable to allocate memory");
+    }
+    const bool porous = gPorosity.porosity.size() == n, sponge = gSponge.sponge.size() == n;
+    for (size_t p = 0; p < n; ++p) {
+        if ((porous && 1.0 - gPorosity.porosity[p] > 0.0001) ||
+            (sponge && static_cast<double>(gSponge.sponge[p]) - 1.0 > 0.0001))
+            r.blocked[p] |= kPorousOrSponge;
+        if (SourceAt(p) > 0) r.blocked[p] |= kSource;
+    }
+}
+
 void CalcBreaking(const float* /*xiExt*/, int32_t axis) {
+    if (gRollers.blocked.size() != gGrid.Points()) PrepareBreaking();
     const BreakingFields f = Fields();
     RelaxSlope(f);
     RenewCelerity(f, axis);

@@ -24,7 +24,11 @@ struct RollerSettings {
     double breakDirection = 0.0;  // radians along the grid's x axis
     double tanInitial = 0.0, tanFinal = 0.0;
     std::vector<float> tanPhi, tanPhiOld, delta, deltaOld, cx, cxOld, cy, cyOld;
+    // Where no roller may stand, whatever the surface does: kPorousOrSponge
+    // (no celerity, no thickness) and kSource (no thickness); PrepareBreaking.
+    std::vector<uint8_t> blocked;
 };
+constexpr uint8_t kPorousOrSponge = 1, kSource = 2;
 extern RollerSettings gRollers;
 
 void SetupWaveBreaking(KvtHandle target);
@@ -33,3 +37,7 @@ void SetupWaveBreaking(KvtHandle target);
 // the shift of the surface levels, so that xi is the level just reached,
 // xiPrev half a step and xiPrev2 a whole step older. xiExt is not used.
 void CalcBreaking(const float* xiExt, int32_t axis);
+// The map of the points where no roller may stand (porosity, sponge, sources
+// of internal generation), before the first step; CalcBreaking makes it
+// itself if it is missing.
+void PrepareBreaking();

@@ -188,6 +188,7 @@ void PrepareTimeLoop() {
     CountWaterPoints(gChains.activePoints);
     SetupSweepBuffers();
     if (gEquation.gridScaleFilter > 0.0f) SetupGridScaleFilter();
+    if (gRollers.type == 1) PrepareBreaking();
     gLoop.lineOrderFlag = true;
 }
 

@@ -324,14 +324,17 @@ BeachProfile RunBeach(bool rollers) {
     for (int32_t n = 1; n <= steps; ++n) {
         ComputeStep(n);
         gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
-        if (rollers)
+        if (rollers) {
             for (size_t p = 0; p < g.Points(); ++p) {
                 const float d = r.delta[p];
                 if (d > 0.0f) out.breaks = true;
                 out.deltaMax = std::max(out.deltaMax, static_cast<double>(d));
                 EXPECT_LE(d, std::max(g.depth[p], 0.0f)) << "step " << n << " point " << p;
-                if (gSponge.sponge[p] > 1.0f) EXPECT_EQ(d, 0.0f) << "step " << n;
+                if (gSponge.sponge[p] > 1.0f) {
+                    EXPECT_EQ(d, 0.0f) << "step " << n;
+                }
             }
+        }
         if (n <= steps - kept) continue;
         for (int32_t j = 0; j <= J; ++j) {
             const double v = g.xi[g.At(j, 2)];

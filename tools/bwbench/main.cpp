@@ -198,16 +198,19 @@ int main(int argc, char** argv) {
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();
     // bwbench [scale [n [family [threads]]]]: a shorter run for tests, or one
-    // grid size, sweep family (0 central, 1 and 2 upwind) and thread count to profile.
+    // grid size, sweep family (0 central, 1 and 2 upwind) and thread count to
+    // profile; bwbench scale n processes: the table of the processes alone.
     const double scale = argc > 1 ? std::atof(argv[1]) : 1.0;
     const int32_t onlyN = argc > 2 ? std::atoi(argv[2]) : 0;
-    const int32_t onlyHandle = argc > 3 ? std::atoi(argv[3]) : -1;
+    // "processes" in place of the family: only the table of the processes.
+    const bool onlyProcesses = argc > 3 && std::string(argv[3]) == "processes";
+    const int32_t onlyHandle = argc > 3 && !onlyProcesses ? std::atoi(argv[3]) : -1;
     const int onlyThreads = argc > 4 ? std::atoi(argv[4]) : 0;
     std::printf("%-11s %-11s %7s %13s %13s %8s %8s %9s %8s %8s\n", "grid", "sweeps", "threads",
                 "points/cpu-s", "points/wall-s", "x-sweep", "y-sweep", "copy GB/s", "B/point",
                 "GB/s");
     for (int32_t n : {200, 500, 1000}) {
-        if (onlyN > 0 && n != onlyN) continue;
+        if ((onlyN > 0 && n != onlyN) || onlyProcesses) continue;
         const int32_t steps = std::max(2, static_cast<int32_t>(scale * 4e7 / (double(n) * n)));
         for (int32_t handle : {0, 1, 2}) {
             if (onlyHandle >= 0 && handle != onlyHandle) continue;
@@ -238,6 +241,6 @@ int main(int argc, char** argv) {
             }
         }
     }
-    if (onlyN == 0 || onlyHandle < 0) ProcessTable(500, scale);
+    if (onlyHandle < 0) ProcessTable(onlyN > 0 ? onlyN : 500, scale);
     return 0;
 }

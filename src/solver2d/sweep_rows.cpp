@@ -649,28 +649,28 @@ void ContinuityRows(const AxisView& v, int32_t k, int32_t first, int32_t last, b
     const float* __restrict qSo = w.qSo.data();
     const float* __restrict por = w.por.data();
     const float* __restrict xiC = xi + base - 1;  // xiC[r] is xi at point first + r - 1
-    if (!gen) {
-        // The pass below without sources, which vectorises; cP and cQ stay
-        // as the zeros they are there, so that a -0 sum becomes +0 alike.
+    // Every point without its source, in a pass that vectorises; cP and cQ
+    // stay as the zeros they are there, so that a -0 sum becomes +0 alike.
 #pragma GCC ivdep
-        for (int32_t r = 1; r <= m; ++r) {
-            const double c = cw[r], cc1 = c / (2.0 - c);
-            const double bc = (central ? cc1 : c) * f4 * por[r];
-            const float bcs = static_cast<float>(bc);
-            Bc[r] = bcs;
-            Rc[r] = static_cast<float>(static_cast<double>(bcs) * xiC[r] -
-                                       (static_cast<double>(p[r]) - p[r - 1]) * cc1 + 0.0 -
-                                       ((static_cast<double>(qC[r]) - qS[r]) +
-                                        cc1 * (static_cast<double>(qCo[r]) - qSo[r]) - 0.0) *
-                                           ratio);
-        }
-        return;
-    }
     for (int32_t r = 1; r <= m; ++r) {
-        const double c = w.c[r], cc1 = c / (2.0 - c);
+        const double c = cw[r], cc1 = c / (2.0 - c);
+        const double bc = (central ? cc1 : c) * f4 * por[r];
+        const float bcs = static_cast<float>(bc);
+        Bc[r] = bcs;
+        Rc[r] = static_cast<float>(static_cast<double>(bcs) * xiC[r] -
+                                   (static_cast<double>(p[r]) - p[r - 1]) * cc1 + 0.0 -
+                                   ((static_cast<double>(qC[r]) - qS[r]) +
+                                    cc1 * (static_cast<double>(qCo[r]) - qSo[r]) - 0.0) *
+                                       ratio);
+    }
+    if (!gen) return;
+    // The points of generation lines once more, with their sources.
+    for (int32_t r = 1; r <= m; ++r) {
         const int32_t i = w.src[r];
-        const double cP = i >= 1 ? v.sF[i] + v.sFPrev[i] * cc1 : 0.0;
-        const double cQ = i >= 1 ? v.sG[i] + v.sGPrev[i] * cc1 : 0.0;
+        if (i < 1) continue;
+        const double c = w.c[r], cc1 = c / (2.0 - c);
+        const double cP = v.sF[i] + v.sFPrev[i] * cc1;
+        const double cQ = v.sG[i] + v.sGPrev[i] * cc1;
         const double bc = (central ? cc1 : c) * f4 * w.por[r];
         const float bcs = static_cast<float>(bc);
         Bc[r] = bcs;

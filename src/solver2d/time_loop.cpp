@@ -107,7 +107,8 @@ namespace {
 // axis 1: the points of the y chains (xiExtX); axis 2: those of the x chains.
 // The points come from the chains' marks, so that the pass runs along the
 // rows of the fields whichever the axis; the rows inside the grid without
-// slot or internal generation take a straight pass over j.
+// slot take a straight pass over j, and the points of generation lines are
+// done once more with their sources.
 void Extrapolate(int32_t axis, float* xiExt) {
     const GridState& g = gGrid;
     const bool x = axis == 1;
@@ -153,7 +154,7 @@ void Extrapolate(int32_t axis, float* xiExt) {
 #pragma omp parallel for schedule(static)
     for (int32_t k = 0; k <= g.K; ++k) {
         const size_t o = k * stride;
-        if (k == 0 || slot || gen) {
+        if (k == 0 || slot) {
             for (int32_t j = 0; j <= g.J; ++j)
                 if (mark[o + j] != 0) point(o + j, j, k);
             continue;
@@ -168,6 +169,12 @@ void Extrapolate(int32_t axis, float* xiExt) {
             const float div = mark[p] == 2 ? (x ? dPx / dx : dQy / dy) : dPx / dx + dQy / dy;
             const float value = static_cast<float>(xiPrev[p] - dt * div / por[p]);
             out[p] = mark[p] != 0 ? value : out[p];
+        }
+        // The sources of generation lines, at their points once more.
+        if (gen) {
+            const int32_t* source = gGeneration.sourceIndex.data() + o;
+            for (int32_t j = 1; j <= g.J; ++j)
+                if (source[j] >= 1 && mark[o + j] != 0) point(o + j, j, k);
         }
     }
 }

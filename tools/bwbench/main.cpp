@@ -85,55 +85,62 @@ double BytesPerPoint(int32_t handle) {
     return 2.0 * 4.0 * (extrapolate + depths + shift + assemble + solve);
 }
 
-// Switches on the processes of a coastal study on the basin: rollers with
-// their default settings, Smagorinsky eddy viscosity (coefficient 0.2) and
-// a generation line along k at j = 10 fed by a sine series, as the model
-// reader would set them up.
-void AddProcesses(int32_t steps) {
+// The processes the table switches on, alone or together.
+enum Process : unsigned { kRollers = 1, kEddy = 2, kGeneration = 4 };
+
+// Switches on processes of a coastal study on the basin as the model reader
+// would set them up: rollers with their default settings, Smagorinsky eddy
+// viscosity (coefficient 0.2), a generation line along k at j = 10 fed by a
+// sine series.
+void AddProcesses(unsigned which, int32_t steps) {
     const GridState& g = gGrid;
     const size_t n = g.Points();
-    RollerSettings& r = gRollers;
-    r.type = 1;
-    r.tanInitial = std::tan(20.0 * 0.01745329238474369);
-    r.tanFinal = std::tan(10.0 * 0.01745329238474369);
-    for (std::vector<float>* f : {&r.tanPhi, &r.tanPhiOld, &r.delta, &r.deltaOld, &r.cx, &r.cxOld,
-                                  &r.cy, &r.cyOld})
-        f->assign(n, 0.0f);
-    for (size_t p = 0; p < n; ++p) {
-        const double d = std::max(-static_cast<double>(g.bed[p]), r.minimumDepth);
-        r.cx[p] = r.cxOld[p] = static_cast<float>(std::sqrt(9.81 * d) * r.velocityFactor);
-        r.tanPhi[p] = r.tanPhiOld[p] = static_cast<float>(r.tanInitial);
-    }
     gSponge.sponge.assign(n, 1.0f);
-
-    EddySettings& e = gEddy;
-    e.eddyType = 2;
-    e.smagorinskyCoef.assign(n, 0.2f);
-    e.eddyViscosity.assign(n, 0.0f);
-
-    GenerationState& s = gGeneration;
-    InternalGenRecord rec;
-    rec.pointCount = g.K - 2;
-    for (int32_t k = 1; k <= g.K - 1; ++k) rec.pointJ.push_back(10), rec.pointK.push_back(k);
-    std::vector<float> series(steps + 1);
-    for (int32_t m = 0; m <= steps; ++m)
-        series[m] = static_cast<float>(0.05 * std::sin(2.0 * M_PI * m * g.dt / 8.0));
-    TsAddSeries(rec.seriesId, series.data());
-    s.numberOfRecords = 1;
-    s.records = {rec};
-    s.lineFiles.resize(1);
-    s.sourceIndex.assign(n, 0);
-    for (int32_t i = 0; i <= rec.pointCount; ++i) {
-        s.sourceIndex[g.At(10, rec.pointK[i])] = 2 * i + 1;
-        s.sourceIndex[g.At(11, rec.pointK[i])] = 2 * i + 2;
+    if (which & kRollers) {
+        RollerSettings& r = gRollers;
+        r.type = 1;
+        r.tanInitial = std::tan(20.0 * 0.01745329238474369);
+        r.tanFinal = std::tan(10.0 * 0.01745329238474369);
+        for (std::vector<float>* f : {&r.tanPhi, &r.tanPhiOld, &r.delta, &r.deltaOld, &r.cx,
+                                      &r.cxOld, &r.cy, &r.cyOld})
+            f->assign(n, 0.0f);
+        for (size_t p = 0; p < n; ++p) {
+            const double d = std::max(-static_cast<double>(g.bed[p]), r.minimumDepth);
+            r.cx[p] = r.cxOld[p] = static_cast<float>(std::sqrt(9.81 * d) * r.velocityFactor);
+            r.tanPhi[p] = r.tanPhiOld[p] = static_cast<float>(r.tanInitial);
+        }
     }
-    s.sourceCount = 2 * (rec.pointCount + 1);
-    for (std::vector<float>* v : {&s.sourceP, &s.sourcePPrev, &s.sourcePPrev2, &s.sourceQ,
-                                  &s.sourceQPrev, &s.sourceQPrev2})
-        v->assign(s.sourceCount + 1, 0.0f);
-    s.lineValues.assign(std::max(g.J, g.K) + 1, 0.0f);
-    s.deepValues = s.lineValues;
-    s.genJ2 = g.J, s.genK2 = g.K;
+    if (which & kEddy) {
+        EddySettings& e = gEddy;
+        e.eddyType = 2;
+        e.smagorinskyCoef.assign(n, 0.2f);
+        e.eddyViscosity.assign(n, 0.0f);
+    }
+    if (which & kGeneration) {
+        GenerationState& s = gGeneration;
+        InternalGenRecord rec;
+        rec.pointCount = g.K - 2;
+        for (int32_t k = 1; k <= g.K - 1; ++k) rec.pointJ.push_back(10), rec.pointK.push_back(k);
+        std::vector<float> series(steps + 1);
+        for (int32_t m = 0; m <= steps; ++m)
+            series[m] = static_cast<float>(0.05 * std::sin(2.0 * M_PI * m * g.dt / 8.0));
+        TsAddSeries(rec.seriesId, series.data());
+        s.numberOfRecords = 1;
+        s.records = {rec};
+        s.lineFiles.resize(1);
+        s.sourceIndex.assign(n, 0);
+        for (int32_t i = 0; i <= rec.pointCount; ++i) {
+            s.sourceIndex[g.At(10, rec.pointK[i])] = 2 * i + 1;
+            s.sourceIndex[g.At(11, rec.pointK[i])] = 2 * i + 2;
+        }
+        s.sourceCount = 2 * (rec.pointCount + 1);
+        for (std::vector<float>* v : {&s.sourceP, &s.sourcePPrev, &s.sourcePPrev2, &s.sourceQ,
+                                      &s.sourceQPrev, &s.sourceQPrev2})
+            v->assign(s.sourceCount + 1, 0.0f);
+        s.lineValues.assign(std::max(g.J, g.K) + 1, 0.0f);
+        s.deepValues = s.lineValues;
+        s.genJ2 = g.J, s.genK2 = g.K;
+    }
 }
 
 // Seconds of wall time per call of a routine, over `calls` calls.
@@ -144,52 +151,58 @@ double PerCall(int32_t calls, F f) {
     return (WallSeconds() - start) / calls;
 }
 
-// The cost of each process beside the bare sweeps, on one grid, 1 thread,
-// central sweeps: milliseconds a step and the share of a whole step.
+struct StepCost {
+    double step = 0.0, sweeps = 0.0, own = 0.0;  // seconds a step
+};
+
+// A run of `steps` steps on the basin with the processes given: the time of
+// a step, of its two sweeps, and of the processes' own routines called
+// again on the state the run left, as often as a step calls them.
+StepCost MeasureStep(int32_t n, unsigned which, int32_t steps) {
+    MakeBasin(n, 0, steps);
+    AddProcesses(which, steps);
+    SetThreads(1);
+    PrepareTimeLoop();
+    StepCost c;
+    c.step = PerCall(steps, [](int32_t s) {
+        ComputeStep(s + 1);
+        gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
+    });
+    c.sweeps = (gLoop.timing.tasks[kTaskXSweep - 1].wallTotal +
+                gLoop.timing.tasks[kTaskYSweep - 1].wallTotal) / steps;
+    if (which & kRollers)
+        c.own += 2.0 * PerCall(steps, [](int32_t s) { CalcBreaking(nullptr, 1 + s % 2); });
+    if (which & kEddy) c.own += PerCall(steps, [](int32_t) { CalcEddyViscosity(); });
+    if (which & kGeneration)
+        c.own += 2.0 * PerCall(steps, [&](int32_t s) { UpdateInternalGeneration(steps, 1 + s % 2); });
+    ResetRunState();
+    return c;
+}
+
+// What each process costs a step on one grid, 1 thread, central sweeps: its
+// own routine, and what it adds to the sweeps (its terms, and for eddy
+// viscosity and rollers the assembly of all lines before the solves), beside
+// the step without processes.
 void ProcessTable(int32_t n, double scale) {
     const int32_t steps = std::max(4, static_cast<int32_t>(scale * 1e7 / (double(n) * n)));
-    std::printf("\nprocesses on %dx%d, central sweeps, 1 thread, %d steps\n", n, n, steps);
-    std::printf("%-34s %12s %10s\n", "part of a step", "ms a step", "of a step");
-    MakeBasin(n, 0, steps);
-    SetThreads(1);
-    PrepareTimeLoop();
-    double bare = PerCall(steps, [](int32_t s) {
-        ComputeStep(s + 1);
-        gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
-    });
-
-    MakeBasin(n, 0, steps);
-    AddProcesses(steps);
-    SetThreads(1);
-    PrepareTimeLoop();
-    const double cpu0 = CpuSeconds();
-    const double full = PerCall(steps, [](int32_t s) {
-        ComputeStep(s + 1);
-        gLoop.lineOrderFlag = !gLoop.lineOrderFlag;
-    });
-    const double cpu = CpuSeconds() - cpu0;
-    const double sweeps = (gLoop.timing.tasks[kTaskXSweep - 1].wallTotal +
-                           gLoop.timing.tasks[kTaskYSweep - 1].wallTotal) / steps;
-    // The processes once more on the state the run left, as often as a step calls them.
-    const double breaking = 2.0 * PerCall(steps, [](int32_t s) {
-        CalcBreaking(gGrid.xiExtX.data(), 1 + s % 2);
-    });
-    const double eddy = PerCall(steps, [](int32_t) { CalcEddyViscosity(); });
-    const double generation = 2.0 * PerCall(steps, [&](int32_t s) {
-        UpdateInternalGeneration(steps, 1 + s % 2);
-    });
-    auto row = [&](const char* name, double seconds) {
-        std::printf("%-34s %12.3f %9.0f%%\n", name, 1e3 * seconds, 100.0 * seconds / full);
-    };
-    row("step without processes", bare);
-    row("step with the processes", full);
-    row("  both sweeps", sweeps);
-    row("  rollers (2 calls)", breaking);
-    row("  Smagorinsky field (1 call)", eddy);
-    row("  generation update (2 calls)", generation);
-    std::printf("points per cpu-s with the processes: %.3e\n",
-                static_cast<double>(gChains.activePoints) * steps / cpu);
-    ResetRunState();
+    std::printf("\nprocesses on %dx%d, central sweeps, 1 thread, %d steps; ms a step\n", n, n,
+                steps);
+    std::printf("%-30s %9s %9s %13s %13s\n", "processes", "step", "sweeps", "own routine",
+                "added");
+    const StepCost bare = MeasureStep(n, 0, steps);
+    const struct {
+        const char* name;
+        unsigned which;
+    } rows[] = {{"none", 0},
+                {"rollers", kRollers},
+                {"Smagorinsky eddy viscosity", kEddy},
+                {"internal generation", kGeneration},
+                {"all three", kRollers | kEddy | kGeneration}};
+    for (const auto& row : rows) {
+        const StepCost c = row.which == 0 ? bare : MeasureStep(n, row.which, steps);
+        std::printf("%-30s %9.2f %9.2f %13.2f %12.0f%%\n", row.name, 1e3 * c.step, 1e3 * c.sweeps,
+                    1e3 * c.own, 100.0 * (c.step - bare.step) / bare.step);
+    }
 }
 
 }  // namespace

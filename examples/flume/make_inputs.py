@@ -5,9 +5,9 @@ data files (see run.sh).
 
 The flume of the plane-slope breaking tests (0.36 m of water, a slope of
 1:34.3 beginning 6 m from the wave maker), three water rows between walls.
-Without a breaking model the waves cannot run up the beach: the flume ends
-at a wall where the still water is 0.12 m deep, and a sponge layer over the
-last 3 m takes the steepening waves out before they would break."""
+The example shows the shoaling only: the flume ends at a wall where the
+still water is 0.12 m deep, and a sponge layer over the last 3 m takes the
+steepening waves out before they break (tools/bwlab/beach.py breaks them)"""
 import math
 
 DX = 0.025               # grid spacing, m (dx/h 0.07)

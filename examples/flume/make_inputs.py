@@ -7,7 +7,7 @@ The flume of the plane-slope breaking tests (0.36 m of water, a slope of
 1:34.3 beginning 6 m from the wave maker), three water rows between walls.
 The example shows the shoaling only: the flume ends at a wall where the
 still water is 0.12 m deep, and a sponge layer over the last 3 m takes the
-steepening waves out before they break (tools/bwlab/beach.py breaks them)"""
+steepening waves out before they break (tools/bwlab/beach.py breaks them)."""
 import math
 
 DX = 0.025               # grid spacing, m (dx/h 0.07)

@@ -5,9 +5,9 @@ mound.xol1), over the bed of bathymetry.asc, into pictures/profiles.png, and
 prints where the waves break.
 
 The wave height at a point is the highest less the lowest surface over the
-last 4 periods, the mean level their average; points where the surface
-stayed under the bed for part of the time (the swash) show the height of
-the water while it was there."""
+last 4 periods, the surface taken at the bed while the point is dry; the
+mean level is drawn where the point stays wet, and the highest point the
+water reaches (the run-up) is marked."""
 import sys
 
 import matplotlib
@@ -27,19 +27,24 @@ def read_grid(path):
 def row(path, bed):
     with netCDF4.Dataset(path) as d:
         x = d["x"][:]
-        s = d["Surface_elevation"][:]
-        roller = d["Roller_thickness"][:]
+        # Dry points are written as missing values.
+        s = np.ma.filled(d["Surface_elevation"][:], np.nan)
+        roller = np.ma.filled(d["Roller_thickness"][:], 0.0)
     wet = s > bed[None, :]
+    always = wet.all(axis=0) & (bed < 0.5)
     s = np.where(wet, s, bed[None, :])
     height = s.max(axis=0) - s.min(axis=0)
-    return x, height, s.mean(axis=0), s[-1], roller[-1]
+    mean = np.where(always, s.mean(axis=0), np.nan)
+    reached = np.nonzero(wet.any(axis=0) & (bed < 0.5))[0]
+    runup = reached[-1] if len(reached) else 0
+    return x, height, mean, s[-1], roller[-1], runup
 
 
 def main():
     bed, dx = read_grid("bathymetry.asc")
     fig, axes = plt.subplots(3, 1, figsize=(9, 8), sharex=True)
     for path, k, colour in (("middle.xol1", 60, "tab:blue"), ("mound.xol1", 40, "tab:red")):
-        x, height, mean, last, roller = row(path, bed[k])
+        x, height, mean, last, roller, runup = row(path, bed[k])
         water = bed[k] < 0.5
         label = f"y = {k * dx:g} m"
         axes[0].plot(x[water], height[water], color=colour, label=label)
@@ -48,10 +53,14 @@ def main():
         axes[2].plot(x[water], last[water], color=colour, label=f"surface, {label}")
         axes[2].fill_between(x[water], last[water], last[water] - roller[water], color=colour,
                              alpha=0.35, lw=0, label=f"roller, {label}")
+        axes[2].plot([x[runup]], [bed[k][runup]], marker="^", color=colour, ls="none",
+                     label=f"run-up, {label}")
         peak = int(np.argmax(np.where(x > 6.0, height, 0.0)))
+        shore = int(np.nonzero(~np.isnan(mean))[0][-1])
         print(f"{label}: the highest wave {height[peak]:.3f} m at x = {x[peak]:.2f} m "
-              f"(still depth {-bed[k][peak]:.3f} m), set-up at the shore "
-              f"{1000.0 * mean[water][-8:].max():.1f} mm")
+              f"(still depth {-bed[k][peak]:.3f} m); mean level {1000.0 * mean[shore]:.1f} mm "
+              f"at x = {x[shore]:.2f} m, the last point always wet; run-up to "
+              f"{1000.0 * bed[k][runup]:.0f} mm at x = {x[runup]:.2f} m")
     axes[0].set_ylabel("wave height (m)")
     axes[1].set_ylabel("mean level (mm)")
     axes[2].set_ylabel("level (m)")
@@ -64,7 +73,6 @@ def main():
     fig.tight_layout()
     out = sys.argv[1] if len(sys.argv) > 1 else "pictures/profiles.png"
     fig.savefig(out, dpi=110)
-    print(out)
 
 
 if __name__ == "__main__":

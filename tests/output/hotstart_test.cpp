@@ -1,7 +1,7 @@
-// Hot-start output as a user gets it: the state file of a run read back (its
-// items, scalars, flag and instant), the former file kept whole when a write
-// fails, files that are not state files refused, and a run split in two that
-// goes on from the file as the unbroken run does.
+// Hot-start output as a user gets it: the state file of a run read back, the
+// former file kept whole when a write fails, files that are not state files
+// refused, and a run split in two that goes on from the file as the unbroken
+// run does.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -12,7 +12,6 @@
 #include <sstream>
 
 #include "data/xolfile.hpp"
-#include "run/datetime.hpp"
 #include "support/model_builder.hpp"
 #include "support/test_support.hpp"
 
@@ -23,25 +22,7 @@ namespace {
 using Sections = std::map<std::string, std::string>;
 using Records = std::vector<std::vector<std::vector<float>>>;  // [record][item][point]
 constexpr float kDelete = -1.0e-30f;
-
-const char* const kItemNames[18] = {"Misc. scalars",
-                                    "Z",
-                                    "S",
-                                    "P",
-                                    "Q",
-                                    "S (old).",
-                                    "P (old)",
-                                    "Q (old)",
-                                    "pxyt (extrapolated)",
-                                    "qxyt (extrapolated)",
-                                    "tanphi",
-                                    "delta",
-                                    "cx",
-                                    "cy",
-                                    "sp",
-                                    "sq",
-                                    "sp (old)",
-                                    "sq (old)"};
+constexpr const char* kAbnormal = "\nAbnormal completion\n";
 
 // Every record of every dynamic item of a map file.
 Records ReadRecords(const std::string& path) {
@@ -59,24 +40,23 @@ Records ReadRecords(const std::string& path) {
     return records;
 }
 
-std::string HotstartSection(const std::string& file, const std::string& span = "") {
+std::string HotstartSection(const std::string& file, const std::string& span) {
     return "Hot_Start = true\nTitle = \"State\"\nFile_Name = file(\"" + file + "\")\n" + span;
 }
+std::string Span(int first, int last) {
+    return "First_Time_Step = " + std::to_string(first) +
+           "\nLast_Time_Step = " + std::to_string(last) + "\n";
+}
 
-// An area record of the whole grid, items surface, P, Q and roller thickness, every step.
-std::string AreaOutput(int J, int K) {
+// Area records of the whole grid to `file`, items surface, P, Q and roller
+// thickness, every step.
+std::string AreaOutput(int J, int K, const std::string& file = "area.xol2") {
     std::ostringstream s;
-    s << "Number_Of_Records = 1\nOutput_Spec_Data_1 {\nFile_Name = file(\"area.xol2\")\n"
+    s << "Number_Of_Records = 1\nOutput_Spec_Data_1 {\nFile_Name = file(\"" << file << "\")\n"
       << "X_Range_And_Interval = 0, " << J << ", 1\nY_Range_And_Interval = 0, " << K << ", 1\n"
       << "First_Time_step = 1\nLast_Time_step = 100000\nTime_Step_Interval = 1\n"
       << "Number_Of_Items = 4\nItem_Numbers = 1, 3, 4, 5\nTitle = \"Area\"\n}\n";
     return s.str();
-}
-
-size_t Count(const std::string& text, const std::string& part) {
-    size_t n = 0;
-    for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) ++n;
-    return n;
 }
 
 class Hotstart : public testing::Test {
@@ -86,18 +66,19 @@ protected:
     std::vector<float> bed;
 
     size_t At(int j, int k) const { return static_cast<size_t>(k) * (grid.J + 1) + j; }
-    // Writes the model as name.bw and runs it.
+    // Writes the model as name.bw and runs it on one thread (two spin at each
+    // barrier when the machine is busy), under the launcher if one is given.
     bwtest::RunResult Run(const std::string& name, const std::string& bathymetry,
                           const Sections& sections, const std::string& launcher = "") {
         bwtest::WriteFile(dir / (name + ".bw"), bwtest::ModelText(bathymetry, sections));
         std::vector<std::string> argv = {bwtest::BuiltProgram("bw"), name + ".bw"};
         if (!launcher.empty())
             argv = {"/bin/sh", "-c", launcher + " exec '" + argv[0] + "' " + name + ".bw"};
-        // One thread: two spin at each barrier when the machine is busy.
         return bwtest::RunProgram(argv, dir.path.string(),
                                   {{"TARN_PROGRESS", "NONE"}, {"OMP_NUM_THREADS", "1"}},
                                   {"BUILDMODE", "TRF"});
     }
+    bool EndsAbnormally() { return bwtest::ReadFile(dir / "m.log").ends_with(kAbnormal); }
 };
 
 // A closed basin of 11 x 9 points whose surface starts tilted both ways.
@@ -119,98 +100,97 @@ protected:
         surface.itemName = "Surface";
         bwtest::WriteMapFile(dir / "xi.xol2", surface, xi0);
     }
-    bwtest::RunResult RunBasin(const std::string& name, const std::string& span,
-                               const std::string& launcher = "") {
+    bwtest::RunResult RunBasin(const std::string& span, const std::string& launcher = "") {
         return Run(
-            name, "bed.xol2",
+            "m", "bed.xol2",
             {{"SURFACE_ELEVATION", "SURFACE_TYPE = 1\n" + bwtest::DataFileSection("xi.xol2")},
              {"Area_Description", "True_land_value = 0.5\nReference_Level_Shift = 0\n"},
              {"Output_Deterministic_2D", AreaOutput(grid.J, grid.K)},
              {"Output_Hotstart_2D", HotstartSection("hot.xol2", span)}},
             launcher);
     }
+    // The writes of the state file the log reports.
+    size_t Writes() {
+        const std::string log = bwtest::ReadFile(dir / "m.log"), title = "  Title  : State\n";
+        size_t n = 0;
+        for (size_t at = log.find(title); at != std::string::npos; at = log.find(title, at + 1))
+            ++n;
+        return n;
+    }
 };
 
 TEST_F(HotstartBasin, TheFileHoldsTheStateOfTheLastDueStep) {
     // The default span: one write, after the last of the 10 steps.
-    bwtest::RunResult r = RunBasin("m", "");
+    bwtest::RunResult r = RunBasin("");
     ASSERT_EQ(r.exitCode, 0) << r.out;
-    EXPECT_EQ(Count(bwtest::ReadFile(dir / "m.log"), "  Title  : State\n"), 1u);
+    EXPECT_EQ(Writes(), 1u);
     EXPECT_FALSE(fs::exists(dir / "hot.xol2.tmp"));
     XolFile f = XolOpenRead(dir / "hot.xol2");
-    EXPECT_EQ(f.dimension, 2);
-    EXPECT_EQ(f.dataType, 11);
-    EXPECT_EQ(f.noStaticItems, 0);
-    EXPECT_EQ(f.noTimeSteps, 1);
-    EXPECT_EQ(f.startDateTime, "2004-01-01 00:00:01");
-    EXPECT_EQ(f.misc[3], 0.5f);
-    EXPECT_EQ(f.projection, "NON-UTM");
-    EXPECT_EQ(std::make_pair(f.axes[0].count, f.axes[1].count), std::make_pair(11, 9));
-    EXPECT_EQ(std::make_pair(f.axes[0].spacing, f.axes[1].spacing), std::make_pair(1.0f, 2.0f));
     ASSERT_EQ(f.noDynamicItems, 18);
-    for (int n = 0; n < 18; ++n) EXPECT_EQ(f.dynamicItems[n].name, kItemNames[n]);
-    EXPECT_EQ(f.dynamicItems[3].type, 100080);
-    EXPECT_EQ(f.dynamicItems[8].type, 999);
+    std::ostringstream shape;
+    shape << f.dimension << "D, type " << f.dataType << ", " << f.noDynamicItems << "+"
+          << f.noStaticItems << " items, " << f.noTimeSteps << " x from " << f.startDateTime
+          << ", land " << f.misc[3] << ", " << f.projection << ", " << f.axes[0].count << " x "
+          << f.axes[0].spacing << ", " << f.axes[1].count << " x " << f.axes[1].spacing
+          << ", types " << f.dynamicItems[3].type << " " << f.dynamicItems[8].type;
+    EXPECT_EQ(shape.str(),
+              "2D, type 11, 18+0 items, 1 x from 2004-01-01 00:00:01, land 0.5, NON-UTM, "
+              "11 x 1, 9 x 2, types 100080 999");
+    std::string names;
+    for (int n = 0; n < f.noDynamicItems; ++n) names += f.dynamicItems[n].name + ";";
+    EXPECT_EQ(names,
+              "Misc. scalars;Z;S;P;Q;S (old).;P (old);Q (old);pxyt (extrapolated);"
+              "qxyt (extrapolated);tanphi;delta;cx;cy;sp;sq;sp (old);sq (old);");
     XolClose(f);
 
-    const Records hot = ReadRecords(dir / "hot.xol2");
-    const Records area = ReadRecords(dir / "area.xol2");
+    const Records hot = ReadRecords(dir / "hot.xol2"), area = ReadRecords(dir / "area.xol2");
     ASSERT_EQ(area.size(), 10u);
+    // The scalars: grid, step, day number of the start, land value, ...
     const std::vector<float>& s = hot[0][0];
     std::vector<float> scalars(s.size(), kDelete);
     const std::pair<int, float> set[] = {
         {1, 10.0f}, {2, 8.0f},  {3, 1.0f},  {4, 2.0f},  {5, 0.1f},  {7, 12418.0f}, {8, 0.0f},
         {9, 0.0f},  {10, 1.0f}, {11, 0.0f}, {15, 0.0f}, {16, 0.0f}, {17, 0.5f},    {20, 1.0f}};
     for (const auto& [at, value] : set) scalars[at] = value;
-    EXPECT_EQ(DayNumber(2004, 1, 1), 12418);
     for (size_t i = 0; i < s.size(); ++i) EXPECT_NEAR(s[i], scalars[i], 1e-6f) << "element " << i;
     EXPECT_EQ(hot[0][1], bed);
-    // Surface and fluxes are those of step 10 wherever the area file has them.
+    // Surface and fluxes those of step 10 wherever the area file has them.
     for (size_t p = 0; p < bed.size(); ++p)
         for (int i : {0, 1, 2})
-            if (area[9][i][p] != kDelete) {
-                EXPECT_EQ(hot[0][2 + i][p], area[9][i][p]) << p;
-            }
+            EXPECT_EQ(area[9][i][p] == kDelete ? kDelete : hot[0][2 + i][p], area[9][i][p]) << p;
     EXPECT_NE(hot[0][2], hot[0][5]);  // xi has moved on from xiPrev
-    // No rollers, no generation: zero maps.
-    for (int n = 10; n < 18; ++n)
+    for (int n = 10; n < 18; ++n)     // no rollers, no generation: zero maps
         EXPECT_TRUE(std::ranges::all_of(hot[0][n], [](float v) { return v == 0.0f; })) << n;
 
-    // Step 0 only: the state before the first step.
-    r = RunBasin("m", "First_Time_Step = 0\nLast_Time_Step = 0\n");
-    ASSERT_EQ(r.exitCode, 0) << r.out;
-    Records at0 = ReadRecords(dir / "hot.xol2");
-    for (size_t p = 0; p < bed.size(); ++p) {
-        if (bed[p] >= 0.5f) continue;  // the chains lay land just dry
-        EXPECT_EQ(at0[0][2][p], xi0[p]) << p;
-        EXPECT_EQ(at0[0][5][p], xi0[p]) << p;
-    }
+    // Step 0 only: the state before the first step (land laid just dry).
+    ASSERT_EQ(RunBasin(Span(0, 0)).exitCode, 0);
+    const Records at0 = ReadRecords(dir / "hot.xol2");
+    for (size_t p = 0; p < bed.size(); ++p)
+        if (bed[p] < 0.5f) {
+            EXPECT_EQ(at0[0][2][p], xi0[p]) << p;
+            EXPECT_EQ(at0[0][5][p], xi0[p]) << p;
+        }
 
     // Steps 0, 4 and 8: three writes, the last one stays.
-    r = RunBasin("m", "First_Time_Step = 0\nTime_Step_Interval = 4\n");
-    ASSERT_EQ(r.exitCode, 0) << r.out;
-    EXPECT_EQ(Count(bwtest::ReadFile(dir / "m.log"), "  Title  : State\n"), 3u);
+    ASSERT_EQ(RunBasin("First_Time_Step = 0\nTime_Step_Interval = 4\n").exitCode, 0);
+    EXPECT_EQ(Writes(), 3u);
     f = XolOpenRead(dir / "hot.xol2");
     EXPECT_EQ(f.startDateTime, "2004-01-01 00:00:00");
     EXPECT_NEAR(f.startOffset, 0.8, 1e-9);
     XolClose(f);
-    at0 = ReadRecords(dir / "hot.xol2");
-    const Records area8 = ReadRecords(dir / "area.xol2");
-    EXPECT_EQ(at0[0][0][10], 0.8f);  // the second of the step
+    const Records at8 = ReadRecords(dir / "hot.xol2"), area8 = ReadRecords(dir / "area.xol2");
+    EXPECT_EQ(at8[0][0][10], 0.8f);  // the second of the step
     for (size_t p = 0; p < bed.size(); ++p)
-        if (area8[7][0][p] != kDelete) {
-            EXPECT_EQ(at0[0][2][p], area8[7][0][p]) << p;
-        }
+        EXPECT_EQ(area8[7][0][p] == kDelete ? kDelete : at8[0][2][p], area8[7][0][p]) << p;
 }
 
-// A write that fails, at whatever point, leaves the former file as it was:
-// the new one goes to a temporary name and replaces the former only once it
-// is whole on disk. A limit on the size of the process's files stands in
-// for a full disk; with its signal ignored the writes fail and the run
-// stops, with its signal the process is killed in the middle of the write.
+// A write that fails anywhere leaves the former file as it was: the new one
+// goes to a temporary name and replaces the former once whole on disk. A
+// limit on the size of the process's files stands in for a full disk: with
+// its signal ignored the writes fail and the run stops, with it the process
+// is killed in the middle of the write.
 TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
-    const std::string span = "First_Time_Step = 0\nLast_Time_Step = 0\n";
-    ASSERT_EQ(RunBasin("m", span).exitCode, 0);
+    ASSERT_EQ(RunBasin(Span(0, 0)).exitCode, 0);
     const std::string hot = dir / "hot.xol2", temporary = dir / "hot.xol2.tmp";
     const std::string good = bwtest::ReadFile(hot);
     auto intact = [&](const std::string& what) {
@@ -220,10 +200,8 @@ TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
         EXPECT_EQ(status, 0) << what;
         if (status == 0) XolClose(f);
     };
-
-    // The temporary name is taken by a folder: the file cannot be created.
-    fs::create_directory(temporary);
-    bwtest::RunResult r = RunBasin("m", span);
+    fs::create_directory(temporary);  // the file cannot be created
+    bwtest::RunResult r = RunBasin(Span(0, 0));
     EXPECT_EQ(r.exitCode, 1);
     EXPECT_EQ(r.out, "Unable to create file for " + hot + "\n");
     EXPECT_TRUE(fs::is_directory(temporary));
@@ -232,98 +210,83 @@ TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
 
     // A limit some 4 kB below the size of the file (the log stays below it).
     const std::string limit = "ulimit -f " + std::to_string(good.size() / 512 - 8) + ";";
-    r = RunBasin("m", span, "trap '' XFSZ;" + limit);
+    r = RunBasin(Span(0, 0), "trap '' XFSZ;" + limit);
     EXPECT_EQ(r.exitCode, 1);
     EXPECT_EQ(r.out, "Flush error\n");
-    EXPECT_TRUE(bwtest::ReadFile(dir / "m.log").ends_with("\nAbnormal completion\n"));
+    EXPECT_TRUE(EndsAbnormally());
     EXPECT_FALSE(fs::exists(temporary));
     intact("full");
-
-    r = RunBasin("m", span, limit);
+    r = RunBasin(Span(0, 0), limit);
     EXPECT_EQ(r.exitCode, 128 + SIGXFSZ);
-    EXPECT_TRUE(fs::exists(temporary));  // left behind by the kill, replaced by the next write
+    EXPECT_TRUE(fs::exists(temporary));  // left by the kill, replaced by the next write
     intact("killed");
 }
 
-// The bathymetry reader refuses a file that is not a state file; a state
-// file without all its items stops in the data layer at the first item that
-// is not there.
+// The reader refuses a file that is not a state file; a state file without
+// all its items stops in the data layer at the first item that is missing.
 TEST_F(HotstartBasin, AFileThatIsNotAStateFileIsRefused) {
     bwtest::MapSpec flagged = grid;
     flagged.dataType = 11;
     bwtest::WriteMapFile(dir / "one.xol2", flagged, bed);
-    const struct {
-        std::string file, out;
-    } cases[] = {
-        {"bed.xol2", "XOL data is not hot start data\n"},
-        {"one.xol2", "TRNXOL Error: Unable to read dynamic item\n"},
-    };
-    for (const auto& c : cases) {
+    for (const auto& [file, out] :
+         {std::pair{"bed.xol2", "XOL data is not hot start data\n"},
+          std::pair{"one.xol2", "TRNXOL Error: Unable to read dynamic item\n"}}) {
         const bwtest::RunResult r =
-            Run("m", c.file,
-                {{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection(c.file)},
+            Run("m", file,
+                {{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection(file)},
                  {"SURFACE_ELEVATION", "-"}});
-        EXPECT_EQ(r.exitCode, 1) << c.file;
-        EXPECT_EQ(r.out, c.out);
-        EXPECT_TRUE(bwtest::ReadFile(dir / "m.log").ends_with("\nAbnormal completion\n")) << c.file;
+        EXPECT_EQ(r.exitCode, 1) << file;
+        EXPECT_EQ(r.out, out);
+        EXPECT_TRUE(EndsAbnormally()) << file;
     }
 }
 
 // A channel of 31 x 5 points, water in the rows k = 1..3, driven by a level
-// boundary at its east end (j = 30) with a sine of period T and amplitude a
-// that grows over its first two periods. With a beach the bed rises from
-// 0.6 m below the datum at the boundary to 0.12 m at j = 1, so that the
-// waves steepen and break before the wall at j = 0.
+// boundary at the east end (j = 30; mirrored, at j = 0) with a sine of period
+// T and amplitude a that grows over two periods. A beach rises from 0.6 m
+// below the datum at the boundary to 0.12 m beside the wall, where waves break.
 class HotstartChannel : public Hotstart {
 protected:
     static constexpr double kDt = 0.1;
     double amplitude = 0.05, period = 2.5;
+    int32_t boundaryJ = 30;
     void SetUp() override {
         grid.J = 30, grid.K = 4;
         WriteChannel(false);
     }
-    int32_t boundaryJ = 30;
-    // With west the channel is mirrored: the boundary at j = 0, the wall at j = J.
     void WriteChannel(bool beach, bool west = false) {
         boundaryJ = west ? 0 : grid.J;
         bed = bwtest::Constant(grid, 1.0f);
         for (int k = 1; k < grid.K; ++k)
             for (int j = 0; j <= grid.J; ++j) {
                 const int fromWall = west ? grid.J - 1 - j : j - 1;
-                if (fromWall < 0) continue;
-                bed[At(j, k)] =
-                    beach ? -0.12f - 0.48f * static_cast<float>(fromWall) / (grid.J - 1) : -1.0f;
+                if (fromWall >= 0)
+                    bed[At(j, k)] =
+                        beach ? -0.12f - 0.48f * static_cast<float>(fromWall) / (grid.J - 1)
+                              : -1.0f;
             }
         bwtest::WriteMapFile(dir / "bed.xol2", grid, bed);
-        std::vector<float> level(400);
-        for (size_t n = 0; n < level.size(); ++n) {
-            const double t = n * kDt;
-            level[n] = static_cast<float>(amplitude * std::min(t / (2 * period), 1.0) *
-                                          std::sin(2 * M_PI * t / period));
-        }
-        bwtest::WriteSeriesFile(dir / "level.xol0", "2004-01-01 00:00:00", kDt, {level});
+        bwtest::WriteSeriesFile(dir / "level.xol0", "2004-01-01 00:00:00", kDt,
+                                {bwtest::RampedSine(amplitude, period, kDt, 400, 2.0)});
     }
-    // The sections of a run of `steps` steps from `start` seconds after
-    // midnight, with the area output to `area` and the given others.
+    // A run of `steps` steps from `start` seconds after midnight, its area
+    // output to `area`.
     Sections Model(int steps, int start, const std::string& area, Sections others) const {
-        std::ostringstream period, boundary;
-        period << "Time_step_count = " << steps << "\nTime_step_interval = " << kDt
-               << "\nWarm_up_period = 0\nStart_time = 2004, 1, 1, 0, 0, " << start << "\n";
+        std::ostringstream time, boundary;
+        time << "Time_step_count = " << steps << "\nTime_step_interval = " << kDt
+             << "\nWarm_up_period = 0\nStart_time = 2004, 1, 1, 0, 0, " << start << "\n";
         boundary << "Number_Of_Boundaries = 1\nBOUNDARY_DATA_1 {\nFirst_Point = " << boundaryJ
                  << ", 1\nLast_Point = " << boundaryJ << ", " << grid.K - 1
                  << "\nFormulation = 0\nData_Specification = 0\n"
                  << bwtest::DataFileSection("level.xol0") << "}\n";
-        std::string output = AreaOutput(grid.J, grid.K);
-        output.replace(output.find("area.xol2"), 9, area);
-        others["Simulation_Period"] = period.str();
+        others["Simulation_Period"] = time.str();
         others["Boundary_Location"] = boundary.str();
-        others["Output_Deterministic_2D"] = output;
+        others["Output_Deterministic_2D"] = AreaOutput(grid.J, grid.K, area);
         return others;
     }
     // The differences of the area items (surface, P, Q, roller thickness)
-    // between the second run and the unbroken one: the largest over the steps
-    // of the second run and the largest at its last step, and whether every
-    // value is the same to the last bit.
+    // between the second run and the unbroken one: the largest over the
+    // second run and at its end, and whether all agree to the last bit.
     struct Split {
         float most[4] = {0, 0, 0, 0}, end[4] = {0, 0, 0, 0};
         bool identical = true;
@@ -332,20 +295,18 @@ protected:
         std::string Text() const {
             std::ostringstream s;
             s << "wave height " << waveHeight << " m, largest P " << flux
-              << " m2/s; differences over the second run (at its end): xi " << most[0] << " ("
-              << end[0] << ") m, P " << most[1] << " (" << end[1] << "), Q " << most[2] << " ("
-              << end[2] << ") m2/s, delta " << most[3] << " (" << end[3] << ") m";
+              << " m2/s; differences (at the end):";
+            const char* names[] = {"xi", "P", "Q", "delta"};
+            for (int i = 0; i < 4; ++i)
+                s << " " << names[i] << " " << most[i] << " (" << end[i] << ")";
             return s.str();
         }
     };
     Split RunSplit(int steps, int n1, const Sections& processes) {
-        Sections first = processes;
-        first["Output_Hotstart_2D"] =
-            HotstartSection("half.xol2", "First_Time_Step = " + std::to_string(n1) +
-                                             "\nLast_Time_Step = " + std::to_string(n1) + "\n");
+        Sections first = processes, second = processes;
+        first["Output_Hotstart_2D"] = HotstartSection("half.xol2", Span(n1, n1));
         bwtest::RunResult r = Run("whole", "bed.xol2", Model(steps, 0, "whole.xol2", first));
         EXPECT_EQ(r.exitCode, 0) << r.out;
-        Sections second = processes;
         second["Bathymetry_Selection"] =
             "Hot_Start = true\n" + bwtest::DataFileSection("half.xol2");
         second["SURFACE_ELEVATION"] = "-";
@@ -353,8 +314,8 @@ protected:
         EXPECT_NEAR(start, n1 * kDt, 1e-9) << "the second run must start on a whole second";
         r = Run("second", "half.xol2", Model(steps - n1, start, "second.xol2", second));
         EXPECT_EQ(r.exitCode, 0) << r.out;
-        const Records whole = ReadRecords(dir / "whole.xol2");
-        const Records rest = ReadRecords(dir / "second.xol2");
+        const Records whole = ReadRecords(dir / "whole.xol2"),
+                      rest = ReadRecords(dir / "second.xol2");
         Split d;
         if (whole.size() != static_cast<size_t>(steps) || rest.size() != whole.size() - n1) {
             ADD_FAILURE() << "records: " << whole.size() << ", " << rest.size();
@@ -363,13 +324,11 @@ protected:
         }
         for (size_t m = 0; m < rest.size(); ++m)
             for (int i = 0; i < 4; ++i) {
-                const std::vector<float>& a = whole[n1 + m][i];
-                const std::vector<float>& b = rest[m][i];
+                const std::vector<float>&a = whole[n1 + m][i], &b = rest[m][i];
                 d.identical = d.identical && std::memcmp(a.data(), b.data(), a.size() * 4) == 0;
                 for (size_t p = 0; p < a.size(); ++p) {
-                    const float e = std::fabs(a[p] - b[p]);
-                    d.most[i] = std::max(d.most[i], e);
-                    if (m + 1 == rest.size()) d.end[i] = std::max(d.end[i], e);
+                    d.most[i] = std::max(d.most[i], std::fabs(a[p] - b[p]));
+                    if (m + 1 == rest.size()) d.end[i] = std::max(d.end[i], std::fabs(a[p] - b[p]));
                 }
             }
         for (size_t p = 0; p < bed.size(); ++p) {
@@ -383,74 +342,55 @@ protected:
         }
         return d;
     }
-    // One generation line across the channel at j = 15, fed by a sine of
-    // flux amplitude s (m2/s) and the channel's period: a series (Wave_Type
-    // 0) or a line file of its three points (any other type).
-    std::string Generation(int waveType, double s) {
-        std::vector<float> flux(400), zero(400, 0.0f);
-        for (size_t n = 0; n < flux.size(); ++n) {
-            const double t = n * kDt;
-            flux[n] = static_cast<float>(s * std::min(t / (2 * period), 1.0) *
-                                         std::sin(2 * M_PI * t / period));
-        }
-        std::string file = "gen.xol0";
-        if (waveType == 0) {
+    // A generation line across the channel at j = 15 fed by a sine of flux
+    // amplitude s (m2/s) and the channel's period: a series (Wave_Type 0) or
+    // a line file of its three points (1).
+    Sections Generation(int waveType, double s) {
+        const std::vector<float> flux = bwtest::RampedSine(s, period, kDt, 400, 2.0),
+                                 zero(400, 0.0f);
+        const std::string file = waveType == 0 ? "gen.xol0" : "gen.xol1";
+        if (waveType == 0)
             bwtest::WriteSeriesFile(dir / file, "2004-01-01 00:00:00", kDt, {flux, zero});
-        } else {
-            file = "gen.xol1";
-            std::vector<std::vector<std::vector<float>>> items(2);
-            for (size_t n = 0; n < flux.size(); ++n) {
-                items[0].push_back(std::vector<float>(3, flux[n]));
-                items[1].push_back(std::vector<float>(3, 0.0f));
-            }
-            bwtest::WriteLineFile(dir / file, "2004-01-01 00:00:00", kDt, grid.dy, items);
-        }
-        return "Number_Of_Records = 1\nINTERNAL_GEN_DATA_1 {\nFirst_Line_Pos = 15, 1\n"
-               "Last_Line_Pos = 15, 3\nWave_Type = " +
-               std::to_string(waveType) + "\nDATA_FILE {\nFile_name = file(\"" + file +
-               "\")\nItem_Count = 2\nItem_Numbers = 1, 2\n}\n}\n";
+        else
+            bwtest::WriteUniformLineFile(dir / file, "2004-01-01 00:00:00", kDt, grid.dy, 3,
+                                         {flux, zero});
+        return {
+            {"Internal_Generation", "Number_Of_Records = 1\n" +
+                                        bwtest::GenerationRecord(1, 15, 1, 15, 3, waveType, file)}};
     }
 };
 
 // Without rollers and generation the file holds the whole state: the second
-// run repeats the unbroken one bit for bit. The split comes after an even
-// step, so that both runs take the lines of their next step in the same order.
-TEST_F(HotstartChannel, ARunSplitInTwoGoesOnBitForBit) {
-    const Split d = RunSplit(60, 20, {});
+// run repeats the unbroken one bit for bit (split after an even step, so that
+// both take the lines of the next step in the same order). A boundary on the
+// west edge keeps the flux across it in a row outside the fields, which the
+// file does not hold, so the second run starts it at 0. Measured: surface
+// 2.2 mm (1.1 mm at the end) in waves of 94 mm, P 0.017 m2/s (0.009) of 0.15.
+TEST_F(HotstartChannel, ARunSplitInTwoGoesOnBitForBitButForAWestBoundary) {
+    Split d = RunSplit(60, 20, {});
     EXPECT_TRUE(d.identical) << d.Text();
     EXPECT_GT(d.waveHeight, 0.05f);
-}
-
-// A boundary on the west edge keeps the flux across that edge in a row
-// outside the fields (the south edge likewise), which the file does not
-// hold: the first step of the second run takes it as 0. Measured: surface
-// 2.2 mm (1.1 mm at the end) in waves of 94 mm, P 0.017 m2/s (0.009) where
-// it reaches 0.15.
-TEST_F(HotstartChannel, ABoundaryOnTheWestEdgeIsNotCarried) {
     WriteChannel(false, true);
-    const Split d = RunSplit(60, 20, {});
+    d = RunSplit(60, 20, {});
     EXPECT_FALSE(d.identical);
     EXPECT_LT(d.most[0], 0.03f * d.waveHeight) << d.Text();
     EXPECT_LT(d.most[1], 0.15f * d.flux) << d.Text();
 }
 
-// Breaking by rollers, split while the waves break on the beach: the file
-// holds the roller fields but not xiPrev2, which the first roller pass of the
-// second run reads as 1e-10 instead of the surface a step back; it sees the
-// whole surface rise within one step and lays rollers wherever the surface
-// stands above tanPhi |c| dt. Measured: surface 11 mm (8 mm at the end) in
-// waves of 204 mm, P 0.023 m2/s (0.014) where it reaches 0.24, roller
-// thickness 7 mm (3 mm).
+// Split while waves break on the beach: the file holds the roller fields but
+// not xiPrev2, which the first roller pass of the second run reads as 1e-10,
+// so it lays rollers wherever the surface stands above tanPhi |c| dt.
+// Measured: surface 11 mm (8 mm at the end) in waves of 204 mm, P 0.023 m2/s
+// (0.014) of 0.24, roller thickness 7 mm (3 mm).
 TEST_F(HotstartChannel, ARestartDuringBreakingDiffersByLittle) {
     amplitude = 0.09, period = 1.5;
     WriteChannel(true);
     const Split d = RunSplit(260, 220,
                              {{"WAVE_BREAKING",
                                "type = 1\ndirection = 90\n"
-                               "initial_breaking_angle = 10\n"
-                               "final_breaking_angle = 6\n"}});
-    const Records half = ReadRecords(dir / "half.xol2");
-    EXPECT_GT(*std::ranges::max_element(half[0][11]), 0.0f) << "no roller at the split";
+                               "initial_breaking_angle = 10\nfinal_breaking_angle = 6\n"}});
+    EXPECT_GT(*std::ranges::max_element(ReadRecords(dir / "half.xol2")[0][11]), 0.0f)
+        << "no roller at the split";
     EXPECT_GT(d.most[3], 0.0f);
     EXPECT_LT(d.most[0], 0.08f * d.waveHeight) << d.Text();
     EXPECT_LT(d.end[0], 0.06f * d.waveHeight) << d.Text();
@@ -458,19 +398,18 @@ TEST_F(HotstartChannel, ARestartDuringBreakingDiffersByLittle) {
     EXPECT_LT(d.most[3], 0.05f * d.waveHeight) << d.Text();
 }
 
-// Internal generation: the file holds the sources of the present and the
-// last half step. A line fed by a series also keeps the half-step value of
-// its record, which starts at 0 in the second run, so that its first source
-// value is half what it should be. Measured: surface 1.4 mm (0.5 mm at the
-// end) in waves of 94 mm, P 0.003 m2/s. A line file is read afresh from the
-// second run's start and agrees to rounding (5e-8 m).
+// The file holds the sources of the present and the last half step. A line
+// fed by a series also keeps the half-step value of its record, which the
+// second run starts at 0, halving its first source value. Measured: surface
+// 1.4 mm (0.5 mm at the end) in waves of 94 mm, P 0.003 m2/s. A line file is
+// read afresh from the second run's start and agrees to rounding (5e-8 m).
 TEST_F(HotstartChannel, ARestartWithInternalGeneration) {
     const double c = std::sqrt(9.81);  // a = s/c in 1 m of water
-    Split d = RunSplit(60, 20, {{"Internal_Generation", Generation(0, 0.03 * c)}});
+    Split d = RunSplit(60, 20, Generation(0, 0.03 * c));
     EXPECT_LT(d.most[0], 0.03f * d.waveHeight) << d.Text();
     EXPECT_LT(d.most[1], 0.04f * d.flux) << d.Text();
     EXPECT_GT(d.most[0], 1e-4f * d.waveHeight) << d.Text();
-    d = RunSplit(60, 20, {{"Internal_Generation", Generation(1, 0.03 * c)}});
+    d = RunSplit(60, 20, Generation(1, 0.03 * c));
     EXPECT_LT(d.most[0], 1e-5f * d.waveHeight) << d.Text();
     EXPECT_LT(d.most[1], 1e-5f * d.flux) << d.Text();
 }

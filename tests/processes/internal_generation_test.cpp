@@ -1,19 +1,17 @@
 // The setup of internal generation: the points of a line, their numbers in
-// the source map, and the line files that feed them.
+// the source map, the line files that feed them and the update of the sources.
 #include "processes/internal_generation.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <sstream>
 
 #include "data/tsfunc.hpp"
-#include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
+#include "solver2d/basin.hpp"
 #include "solver2d/model_state.hpp"
 #include "support/log_capture.hpp"
 #include "support/model_builder.hpp"
-#include "support/test_support.hpp"
 
 namespace {
 
@@ -35,53 +33,29 @@ protected:
         g.dt = 0.5, g.timeStepCount = 10, g.lastStep = 9;
         g.start = MakeDateTime(2004, 1, 1, 0, 0, 0);
     }
-    void TearDown() override {
-        for (InternalLineFile& l : gGeneration.lineFiles)
-            if (l.file.mode == 1) XolClose(l.file);
-        gGeneration = GenerationState{};
+    void TearDown() override { bwtest::ClearGeneration(); }
+    void SetupText(const std::string& records, size_t count) {
+        bwtest::SetupFromText(dir,
+                              "Internal_Generation {\nNumber_Of_Records = " +
+                                  std::to_string(count) + "\n" + records + "}\n",
+                              SetupInternalGeneration);
     }
-    // Writes a line file for each line (record n holds the value n at every
-    // point, item 2 ten times that) and sets up generation from them.
+    // A line file for each line, record n holding n at every point (item 2
+    // ten times that), and generation set up from them.
     void Setup(const std::vector<Line>& lines, const std::string& fileStart = "2004-01-01 00:00:00",
                double step = 1.0, int records = 10) {
-        std::ostringstream s;
-        s << "TARNEL_BOUSSINESQ_WAVE {\nInternal_Generation {\nNumber_Of_Records = " << lines.size()
-          << "\n";
+        std::string text;
         for (size_t i = 0; i < lines.size(); ++i) {
             const Line& l = lines[i];
             const std::string name = "line" + std::to_string(i + 1) + ".xol1";
-            std::vector<std::vector<std::vector<float>>> items(l.items);
-            for (int it = 0; it < l.items; ++it)
-                for (int n = 0; n < records; ++n)
-                    items[it].push_back(std::vector<float>(l.points, (it == 0 ? 1.0f : 10.0f) * n));
-            bwtest::WriteLineFile(dir / name, fileStart, step, 1.0f, items);
-            s << "INTERNAL_GEN_DATA_" << i + 1 << " {\nFirst_Line_Pos = " << l.j1 << ", " << l.k1
-              << "\nLast_Line_Pos = " << l.j2 << ", " << l.k2 << "\nWave_Type = 1\n"
-              << bwtest::DataFileSection(name) << "}\n";
+            std::vector<std::vector<float>> items(l.items);
+            for (int n = 0; n < records; ++n)
+                for (int it = 0; it < l.items; ++it)
+                    items[it].push_back((it == 0 ? 1.0f : 10.0f) * n);
+            bwtest::WriteUniformLineFile(dir / name, fileStart, step, 1.0f, l.points, items);
+            text += bwtest::GenerationRecord(i + 1, l.j1, l.k1, l.j2, l.k2, 1, name);
         }
-        s << "}\n}\n";
-        bwtest::WriteFile(dir / "m.bw", s.str());
-        KvtHandle file = KvtOpenFile(dir / "m.bw", false);
-        SetupInternalGeneration(KvtOpenTarget(file, "TARNEL_BOUSSINESQ_WAVE"));
-        kvtClose(&file);
-    }
-    // Sets up generation from the records given as the body of the section.
-    void SetupText(const std::string& records, int count) {
-        bwtest::WriteFile(dir / "m.bw",
-                          "TARNEL_BOUSSINESQ_WAVE {\nInternal_Generation {\nNumber_Of_Records = " +
-                              std::to_string(count) + "\n" + records + "}\n}\n");
-        KvtHandle file = KvtOpenFile(dir / "m.bw", false);
-        SetupInternalGeneration(KvtOpenTarget(file, "TARNEL_BOUSSINESQ_WAVE"));
-        kvtClose(&file);
-    }
-    static std::string Record(int n, int j1, int k1, int j2, int k2, int waveType,
-                              const std::string& file, int items) {
-        return "INTERNAL_GEN_DATA_" + std::to_string(n) +
-               " {\nFirst_Line_Pos = " + std::to_string(j1) + ", " + std::to_string(k1) +
-               "\nLast_Line_Pos = " + std::to_string(j2) + ", " + std::to_string(k2) +
-               "\nWave_Type = " + std::to_string(waveType) + "\nDATA_FILE {\nFile_name = file(\"" +
-               file + "\")" + "\nItem_Count = " + std::to_string(items) +
-               "\nItem_Numbers = 1, 2\n}\n}\n";
+        SetupText(text, lines.size());
     }
     int32_t Number(int32_t j, int32_t k) { return gGeneration.sourceIndex[gGrid.At(j, k)]; }
     float P(int32_t j, int32_t k) { return gGeneration.sourceP[Number(j, k)]; }
@@ -89,27 +63,24 @@ protected:
 };
 
 TEST_F(Generation, EveryKindOfLineNumbersItsPointsAndNeighboursAndReadsItsFile) {
-    // Along k with its ends given high first (feeds x: the east neighbour),
-    // along j (feeds y: the north neighbour), a single point (both
-    // neighbours) and an oblique line (no neighbour, rounded onto the grid).
-    // Their files hold records every 2 s from 3 s before the start.
+    // Along k given high end first (feeds x: the east neighbour), along j
+    // (feeds y: the north neighbour), a single point (both) and an oblique
+    // line (no neighbour, rounded onto the grid); records every 2 s from 3 s
+    // before the start.
     gEquation.deepWaterTerms = true;
     Setup({{10, 20, 10, 5, 16}, {3, 2, 6, 2, 4}, {5, 5, 5, 5, 1}, {15, 5, 25, 10, 11}},
           "2003-12-31 23:59:57", 2.0);
     gEquation.deepWaterTerms = false;
-    // (j, k, number): the ends of each line and their neighbours, the
-    // oblique line's rounding; 0 beyond an end, beside a line and beside a
-    // single point.
+    // (j, k, number): ends, neighbours, the oblique rounding; 0 beyond an
+    // end, beside a line and beside a single point.
     const int numbers[][3] = {
         {10, 20, 1},  {11, 20, 2}, {10, 5, 31}, {11, 5, 32}, {3, 2, 33},  {3, 3, 34},  {6, 2, 39},
         {6, 3, 40},   {5, 5, 41},  {6, 5, 42},  {5, 6, 43},  {15, 5, 44}, {16, 6, 45}, {17, 6, 46},
         {25, 10, 54}, {10, 21, 0}, {9, 10, 0},  {12, 10, 0}, {7, 2, 0},   {4, 5, 0},   {16, 5, 0}};
     for (const auto& [j, k, n] : numbers) EXPECT_EQ(Number(j, k), n) << j << "," << k;
     EXPECT_EQ(gGeneration.sourceCount, 54);
-
-    // A line file starts with the records around the start: the older one
-    // 1 s before it, the newer 1 s after it; item 2 is read with the
-    // deep-water terms.
+    // The records around the start (1 s before, 1 s after); item 2 read with
+    // the deep-water terms.
     const InternalLineFile& l = gGeneration.lineFiles[1];
     EXPECT_DOUBLE_EQ(l.olderTime, -1.0);
     EXPECT_EQ(l.older, std::vector<float>(4, 1.0f));
@@ -117,51 +88,45 @@ TEST_F(Generation, EveryKindOfLineNumbersItsPointsAndNeighboursAndReadsItsFile) 
     EXPECT_EQ(l.deepNewer, std::vector<float>(4, 20.0f));
 }
 
-TEST_F(Generation, WrongLineFilesStopTheRun) {
+TEST_F(Generation, WrongLineFilesStopTheRunAndOneThatReachesTheLastStepIsTaken) {
     setenv("TRF", "HUD", 1);
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 5}}), testing::ExitedWithCode(1),
                 "XOL data does not have the correct number of grid points \\(x.dir.\\)");
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 4, 1}}), testing::ExitedWithCode(1),
                 "XOL data does not contain the correct number of items");
-    // A series where a line file belongs.
     bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0,
                             {std::vector<float>(10, 0.0f), std::vector<float>(10, 0.0f)});
-    EXPECT_EXIT(SetupText(Record(1, 10, 5, 10, 8, 1, "series.xol0", 2), 1),
+    EXPECT_EXIT(SetupText(bwtest::GenerationRecord(1, 10, 5, 10, 8, 1, "series.xol0"), 1),
                 testing::ExitedWithCode(1), "XOL data is not 1D");
-    // The y half of the last of the 10 steps of 0.5 s asks for 5 s: a file
-    // of records every 0.5 s from the start must have 11 of them, and one
-    // that starts a second late does not cover the start.
+    // The y half of the last of 10 steps of 0.5 s asks for 5 s: records every
+    // 0.5 s need 11 of them, and a file a second late misses the start.
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.5, 10),
                 testing::ExitedWithCode(1), "XOL data does not cover the simulation period");
     EXPECT_EXIT(Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:01", 0.5, 20),
                 testing::ExitedWithCode(1), "XOL data does not cover the simulation period");
     unsetenv("TRF");
-}
 
-TEST_F(Generation, AFileThatReachesTheEndOfTheLastStepIsTaken) {
     Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.5, 11);
     EXPECT_EQ(gGeneration.lineFiles[0].records, 11);
-    TearDown();
-    // 33 steps of 0.1 s against 11 steps of 0.3 s: the sums differ in the
-    // last bit (3.3000000000000003 against 3.3), and the file still covers
-    // the run.
+    bwtest::ClearGeneration();
+    // 33 steps of 0.1 s against 11 of 0.3 s differ in the last bit
+    // (3.3000000000000003 against 3.3): the file still covers the run.
     gGrid.dt = 0.1, gGrid.timeStepCount = 33;
     Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.3, 12);
     EXPECT_EQ(gGeneration.lineFiles[0].records, 12);
 }
 
 TEST_F(Generation, TheUpdateFeedsEachKindOfLineAtTheMiddleAndTheEndOfTheStep) {
-    // A line along k fed by a constant series (0.4, deep item 4), a line
-    // along j given high end first and fed by a file whose value grows with
-    // time and along the line (record n, point s: n + 0.1 s; deep item ten
-    // times that, one record a second, the step is 0.5 s), and an oblique
-    // line fed by the same kind of file.
+    // A line along k fed by a constant series (0.4, deep item 4); a line along
+    // j, high end first, and an oblique line, both fed by files of one record
+    // a second whose point s at record n holds n + 0.1 s (deep item ten times
+    // that); steps of 0.5 s.
     gEquation.deepWaterTerms = true;
     TsReset();
     TsInit(gGrid.timeStepCount + 1);
     bwtest::WriteSeriesFile(dir / "c.xol0", "2004-01-01 00:00:00", 0.5,
                             {std::vector<float>(11, 0.4f), std::vector<float>(11, 4.0f)});
-    auto lineFile = [&](const std::string& name, int points) {
+    for (const auto& [name, points] : {std::pair{"down.xol1", 4}, std::pair{"oblique.xol1", 11}}) {
         std::vector<std::vector<std::vector<float>>> items(2);
         for (int n = 0; n < 6; ++n) {
             std::vector<float> v(points);
@@ -171,11 +136,10 @@ TEST_F(Generation, TheUpdateFeedsEachKindOfLineAtTheMiddleAndTheEndOfTheStep) {
             items[1].push_back(v);
         }
         bwtest::WriteLineFile(dir / name, "2004-01-01 00:00:00", 1.0, 1.0f, items);
-    };
-    lineFile("down.xol1", 4);
-    lineFile("oblique.xol1", 11);
-    SetupText(Record(1, 2, 2, 2, 4, 0, "c.xol0", 2) + Record(2, 8, 3, 5, 3, 1, "down.xol1", 2) +
-                  Record(3, 15, 5, 25, 10, 1, "oblique.xol1", 2),
+    }
+    SetupText(bwtest::GenerationRecord(1, 2, 2, 2, 4, 0, "c.xol0") +
+                  bwtest::GenerationRecord(2, 8, 3, 5, 3, 1, "down.xol1") +
+                  bwtest::GenerationRecord(3, 15, 5, 25, 10, 1, "oblique.xol1"),
               3);
     const GenerationState& g = gGeneration;
     auto obliqueIsEmpty = [&] {
@@ -183,9 +147,9 @@ TEST_F(Generation, TheUpdateFeedsEachKindOfLineAtTheMiddleAndTheEndOfTheStep) {
             if (g.sourceP[i] != 0.0f || g.sourceQ[i] != 0.0f) return false;
         return true;
     };
-    // Step 1: the series gives half its value at the x half and all of it
-    // at the y half; the file is read at 0.5 s for the y half, point s = 0
-    // being the high end (8,3), and both rows of the line take the value.
+    // Step 1: the series gives half its value at the x half, all of it at the
+    // y half; the file is read at 0.5 s for the y half, s = 0 at the high end
+    // (8,3), and both rows of the line take the value.
     TsReadStep(1);
     UpdateInternalGeneration(1, 1);
     EXPECT_FLOAT_EQ(P(2, 2), 0.2f);

@@ -6,6 +6,7 @@
 #include <numbers>
 
 #include "data/tsfunc.hpp"
+#include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
 #include "processes/porosity.hpp"
 #include "processes/sponge.hpp"
@@ -107,14 +108,41 @@ double Omega2(double k, double d, double B) {
            (1.0 + (B + 1.0 / 3.0) * kd * kd);
 }
 
+double WaveNumber(double omega, double d, double B) {
+    double lo = 1e-6, hi = 100.0;
+    for (int i = 0; i < 200; ++i)
+        (Omega2(0.5 * (lo + hi), d, B) < omega * omega ? lo : hi) = 0.5 * (lo + hi);
+    return 0.5 * (lo + hi);
+}
+
+void AddWestBoundary(int32_t formulation, const std::vector<float>& series,
+                     const std::vector<float>& deep) {
+    BoundaryRecord r;
+    r.first[0] = 0, r.first[1] = 1, r.last[0] = 0, r.last[1] = gGrid.K - 1;
+    r.orientation = 1, r.formulation = formulation;
+    TsAddSeries(r.seriesId, series.data());
+    if (!deep.empty()) TsAddSeries(r.deepSeriesId, deep.data());
+    gBoundaries.numberOfBoundaries = 1;
+    gBoundaries.records = {r};
+    BoundaryTable table;
+    table.rows = gGrid.K - 1;
+    table.values.assign(6 * table.rows, 0.0f);
+    for (int32_t row = 0; row < table.rows; ++row)
+        table.Value(row, 2) = static_cast<float>(formulation);
+    gBoundaries.boundaryValues = {table};
+}
+
+void ClearGeneration() {
+    for (InternalLineFile& l : gGeneration.lineFiles)
+        if (l.file.mode == 1) XolClose(l.file);
+    gGeneration = GenerationState{};
+}
+
 Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t waves,
                     int32_t periods) {
     const double B = deep ? static_cast<double>(1.0f / 15.0f) : 0.0, omega = 2.0 * kPi / T;
-    double lo = 1e-6, hi = 100.0;  // the wave number in 1 m of water, by bisection
-    for (int i = 0; i < 200; ++i)
-        (Omega2(0.5 * (lo + hi), 1.0, B) < omega * omega ? lo : hi) = 0.5 * (lo + hi);
     Channel ch;
-    ch.k = 0.5 * (lo + hi), ch.c = omega / ch.k, ch.dt = T / 60.0, ch.J = 30 * waves,
+    ch.k = WaveNumber(omega, 1.0, B), ch.c = omega / ch.k, ch.dt = T / 60.0, ch.J = 30 * waves,
     ch.steps = 60 * periods;
     BasinSpec s;
     s.dx = s.dy = static_cast<float>(2.0 * kPi / ch.k / 30.0);
@@ -122,9 +150,6 @@ Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t 
     MakeBasin(s);
     ch.dx = s.dx;
 
-    BoundaryRecord r;
-    r.first[0] = 0, r.first[1] = 1, r.last[0] = 0, r.last[1] = s.K - 1;
-    r.orientation = 1, r.formulation = formulation;
     std::vector<float> series(s.steps + 1), across(s.steps + 1);
     const double amplitude = formulation == 0 ? a : a * ch.c, ramp = 4.0 * T;
     for (int32_t n = 0; n <= s.steps; ++n) {
@@ -134,16 +159,7 @@ Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t 
             formulation == 0 ? -ch.k * ch.k * a * rise * std::sin(omega * t)
                              : -ch.k * a * rise * std::cos(omega * t - ch.k * 0.5 * s.dx));
     }
-    TsAddSeries(r.seriesId, series.data());
-    if (deep) TsAddSeries(r.deepSeriesId, across.data());
-    gBoundaries.numberOfBoundaries = 1;
-    gBoundaries.records = {r};
-    BoundaryTable table;
-    table.rows = s.K - 1;
-    table.values.assign(6 * table.rows, 0.0f);
-    for (int32_t row = 0; row < table.rows; ++row)
-        table.Value(row, 2) = static_cast<float>(formulation);
-    gBoundaries.boundaryValues = {table};
+    AddWestBoundary(formulation, series, deep ? across : std::vector<float>{});
     return ch;
 }
 

@@ -38,6 +38,15 @@ std::vector<double> ZeroCrossings(const std::vector<double>& values, double dt);
 // the equations solved, B the dispersion factor (0 without the deep-water terms):
 //   w^2 = g d k^2 (1 + B (kd)^2) / (1 + (B + 1/3) (kd)^2).
 double Omega2(double k, double d, double B);
+// The wave number of angular frequency omega in depth d, by bisection.
+double WaveNumber(double omega, double d, double B);
+
+// An open boundary of the formulation (0 level, 1 flux) along the west end,
+// j = 0 and k = 1..K-1, driven by series and, if not empty, by deep.
+void AddWestBoundary(int32_t formulation, const std::vector<float>& series,
+                     const std::vector<float>& deep = {});
+// Closes the line files of internal generation and clears its state.
+void ClearGeneration();
 
 // A channel along x in 1 m of water, K = 4, `waves` wavelengths long at 30
 // cells a wavelength and run for `periods` periods at 60 steps a period. Its

@@ -3,6 +3,9 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cmath>
+#include <numbers>
+#include <sstream>
 
 #include "data/xolfile.hpp"
 
@@ -61,6 +64,34 @@ void WriteLineFile(const std::string& path, const std::string& start, double ste
     for (size_t n = 0; n < items[0].size(); ++n)
         for (const auto& item : items) XolWriteDynamic(f, item[n].data());
     XolClose(f);
+}
+
+void WriteUniformLineFile(const std::string& path, const std::string& start, double step,
+                          float spacing, int points, const std::vector<std::vector<float>>& items) {
+    std::vector<std::vector<std::vector<float>>> lines(items.size());
+    for (size_t i = 0; i < items.size(); ++i)
+        for (float v : items[i]) lines[i].emplace_back(static_cast<size_t>(points), v);
+    WriteLineFile(path, start, step, spacing, lines);
+}
+
+std::vector<float> RampedSine(double a, double T, double dt, size_t count, double rampPeriods) {
+    std::vector<float> v(count);
+    for (size_t n = 0; n < count; ++n) {
+        const double t = n * dt;
+        v[n] = static_cast<float>(a * std::min(t / (rampPeriods * T), 1.0) *
+                                  std::sin(2.0 * std::numbers::pi * t / T));
+    }
+    return v;
+}
+
+std::string GenerationRecord(int n, int j1, int k1, int j2, int k2, int waveType,
+                             const std::string& file) {
+    std::ostringstream s;
+    s << "INTERNAL_GEN_DATA_" << n << " {\nFirst_Line_Pos = " << j1 << ", " << k1
+      << "\nLast_Line_Pos = " << j2 << ", " << k2 << "\nWave_Type = " << waveType
+      << "\nDATA_FILE {\nFile_name = file(\"" << file
+      << "\")\nItem_Count = 2\nItem_Numbers = 1, 2\n}\n}\n";
+    return s.str();
 }
 
 std::string DataFileSection(const std::string& file, int item) {

@@ -7,6 +7,9 @@
 #include <string>
 #include <vector>
 
+#include "input/kvt_access.hpp"
+#include "support/test_support.hpp"
+
 namespace bwtest {
 
 // A map over (0..J, 0..K), values x fastest, one item, one step, on the
@@ -32,6 +35,14 @@ void WriteLineFile(const std::string& path, const std::string& start, double ste
                    const std::vector<std::vector<std::vector<float>>>& items, int dataType = 0,
                    const std::vector<std::string>& names = {});
 
+// A line file of `points` points holding the same value at each:
+// items[i][n] is item i at step n.
+void WriteUniformLineFile(const std::string& path, const std::string& start, double step,
+                          float spacing, int points, const std::vector<std::vector<float>>& items);
+// count samples, dt apart from 0, of a sine of amplitude a and period T whose
+// amplitude rises linearly over its first rampPeriods periods.
+std::vector<float> RampedSine(double a, double T, double dt, size_t count, double rampPeriods);
+
 // The text of a model file that holds every section of the tree in its
 // order. Each section's body has a working default (a cold start at level 0,
 // no processes, no outputs); sections[name] replaces the body of a section,
@@ -42,5 +53,19 @@ std::string ModelText(const std::string& bathymetryFile,
 
 // The body of a DATA_FILE section naming a file with item 1.
 std::string DataFileSection(const std::string& file, int item = 1);
+// One INTERNAL_GEN_DATA_n record: the line (j1,k1)..(j2,k2) fed by items 1
+// and 2 of file.
+std::string GenerationRecord(int n, int j1, int k1, int j2, int k2, int waveType,
+                             const std::string& file);
+
+// Writes `sections` as the body of a model file in dir and hands the file's
+// top section to setup (a Setup... function of the model reader).
+template <typename Setup>
+void SetupFromText(const TempDir& dir, const std::string& sections, Setup setup) {
+    WriteFile(dir / "m.bw", "TARNEL_BOUSSINESQ_WAVE {\n" + sections + "}\n");
+    KvtHandle file = KvtOpenFile(dir / "m.bw", false);
+    setup(KvtOpenTarget(file, "TARNEL_BOUSSINESQ_WAVE"));
+    kvtClose(&file);
+}
 
 }  // namespace bwtest

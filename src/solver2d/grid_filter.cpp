@@ -19,12 +19,11 @@ constexpr uint8_t kEast = 1, kWest = 2, kNorth = 4, kSouth = 8, kWet = 16, kFilt
 // A point of the chains; with the moving shoreline only where the surface
 // stands at or above the bed (a storage width of 1): the filter leaves the
 // slot alone and mirrors the surface at the waterline, so that it moves no
-// water across it.
+// water across it. Read from the map that each setup makes first.
 bool Water(int32_t j, int32_t k) {
     const GridState& g = gGrid;
     if (j < 0 || j > g.J || k < 0 || k > g.K) return false;
-    const size_t p = g.At(j, k);
-    return gChains.codeX[p] >= 1 && (gShoreline.type <= 0 || g.xi[p] >= g.bed[p]);
+    return gGridFilter.water[g.At(j, k)] != 0;
 }
 
 // A point of the chains, wet or in the slot.
@@ -45,7 +44,7 @@ bool Mark(int32_t j, int32_t k) {
 
 // Whether (j,k) is left alone: an open boundary point, whose values the
 // boundary gives, or a point within two of a generation source along x or y.
-bool Kept(int32_t j, int32_t k) {
+bool KeptAt(int32_t j, int32_t k) {
     const GridState& g = gGrid;
     if (Mark(j, k)) return true;
     if (gGeneration.numberOfRecords == 0) return false;
@@ -56,6 +55,13 @@ bool Kept(int32_t j, int32_t k) {
     for (int32_t d = -2; d <= 2; ++d)
         if (source(j + d, k) || source(j, k + d)) return true;
     return false;
+}
+
+// KeptAt from the map made with the first tables.
+bool Kept(int32_t j, int32_t k) {
+    const GridState& g = gGrid;
+    if (j < 0 || j > g.J || k < 0 || k > g.K) return false;
+    return gGridFilter.kept[g.At(j, k)] != 0;
 }
 
 // The second differences along x and y of field F into lapX, lapY. A missing
@@ -118,6 +124,22 @@ void SetupGridScaleFilter() {
     s.faceX.assign(n, 0);
     s.faceY.assign(n, 0);
     if (s.lapX.size() != n) s.lapX.assign(n, 0.0f), s.lapY.assign(n, 0.0f);
+    // Boundaries and sources do not move: the points they keep are found
+    // once; with the moving shoreline the tables are renewed every step.
+    if (s.kept.size() != n) {
+        s.kept.assign(n, 0);
+        for (int32_t k = 0; k <= g.K; ++k)
+            for (int32_t j = 0; j <= g.J; ++j) s.kept[g.At(j, k)] = KeptAt(j, k) ? 1 : 0;
+    }
+    s.water.resize(n);
+    const int32_t* code = gChains.codeX.data();
+    const float* xi = g.xi.data();
+    const float* bed = g.bed.data();
+    const bool slot = gShoreline.type > 0;
+#pragma omp parallel for schedule(static)
+    for (int32_t k = 0; k <= g.K; ++k)
+        for (size_t p = g.At(0, k); p <= g.At(g.J, k); ++p)
+            s.water[p] = (code[p] >= 1) & (!slot | (xi[p] >= bed[p]));
     // The neighbour bits of a place that is wet by the test given: a point,
     // or the face east (di 1) or north (dk 1) of it.
     auto table = [](auto wet, int32_t j, int32_t k, int32_t di, int32_t dk) -> uint8_t {
@@ -133,6 +155,7 @@ void SetupGridScaleFilter() {
     auto point = [](int32_t j, int32_t k) { return Water(j, k); };
     auto faceX = [](int32_t j, int32_t k) { return Water(j, k) && Water(j + 1, k); };
     auto faceY = [](int32_t j, int32_t k) { return Water(j, k) && Water(j, k + 1); };
+#pragma omp parallel for schedule(static)
     for (int32_t k = 0; k <= g.K; ++k)
         for (int32_t j = 0; j <= g.J; ++j) {
             const size_t p = g.At(j, k);

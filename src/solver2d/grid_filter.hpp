@@ -34,6 +34,10 @@ struct GridFilterState {
     // Per point: the neighbours the stencil may use and whether the point
     // (or the face east or north of it) is filtered; see grid_filter.cpp.
     std::vector<uint8_t> point, faceX, faceY;
+    // Per point, made with the first tables: 1 where the filter leaves the
+    // point alone whatever the waterline does (open boundaries, sources).
+    std::vector<uint8_t> kept;
+    std::vector<uint8_t> water;  // 1 at the points the filter works on, renewed by each setup
     Field lapX, lapY;  // second differences of the field being filtered
 };
 extern GridFilterState gGridFilter;

@@ -74,3 +74,43 @@ void SlotCorrection(float* target, const float* bed) {
         }
     }
 }
+
+// A drying point in the slot has a storage width near `width`: a flux held
+// across the other half step would drain it 1/width times faster than its
+// water allows, deep into the slot in one half step, and the next sweep
+// would take the depth of that surface near 0. The limit keeps such a point
+// from losing more than it holds.
+void LimitOutflow(int32_t axis) {
+    GridState& g = gGrid;
+    ShorelineSettings& s = gShoreline;
+    const size_t n = g.Points(), stride = g.Stride();
+    if (s.outflowFactor.size() != n) s.outflowFactor.assign(n, 1.0f);
+    float* factor = s.outflowFactor.data();
+    float* F = axis == 1 ? g.P.data() : g.Q.data();
+    const size_t along = axis == 1 ? 1 : stride;
+    // Water above the bed that may leave over the half step, as a flux sum.
+    const double scale = 0.5 * (axis == 1 ? g.dx : g.dy) / (0.5 * g.dt);
+    const float* xi = g.xi.data();
+    const float* bed = g.bed.data();
+    const int32_t J = g.J, K = g.K;
+#pragma omp parallel for schedule(static)
+    for (int32_t k = 1; k < K; ++k)
+        for (size_t p = g.At(1, k); p < g.At(J, k); ++p) {
+            const double out = std::max(static_cast<double>(F[p]), 0.0) +
+                               std::max(-static_cast<double>(F[p - along]), 0.0);
+            const double water = std::max(static_cast<double>(xi[p]) - bed[p], 0.0);
+            const double allowed = water * scale;
+            factor[p] = out > allowed ? static_cast<float>(allowed / out) : 1.0f;
+        }
+#pragma omp parallel for schedule(static)
+    for (int32_t k = 1; k < K; ++k)
+        for (size_t p = g.At(1, k); p < g.At(J, k); ++p) {
+            // The face between p and the next point along the axis.
+            const size_t q = p + along;
+            const bool inner = axis == 1 ? p + 1 < g.At(J, k) : k + 1 < K;
+            if (F[p] > 0.0f && factor[p] < 1.0f)
+                F[p] *= factor[p];
+            else if (F[p] < 0.0f && inner && factor[q] < 1.0f)
+                F[p] *= factor[q];
+        }
+}

@@ -6,6 +6,7 @@
 #pragma once
 
 #include <cstdint>
+#include <vector>
 
 #include "platform/kvt/kvt.hpp"
 
@@ -16,6 +17,7 @@ struct ShorelineSettings {
     double lambda = 100.0;         // smoothing_parameter: shape of the transition
     double frictionCoefficient = 0.0;  // handed to the mesh solver only
     double maxDepth = 999.0;       // slotMaxDepth
+    std::vector<float> outflowFactor;  // LimitOutflow's work field
 };
 extern ShorelineSettings gShoreline;
 
@@ -29,3 +31,10 @@ float StorageWidthAt(int32_t j, int32_t k, float surface);
 // Replaces the plain depth target = surface - bed by the slot's cross-section
 // at every point below the land value. Parallel over rows.
 void SlotCorrection(float* target, const float* bed);
+// After the sweep of the axis (1: P, 2: Q): no point may send out through
+// that flux, over the half step in which the other sweep holds it, more
+// than half of the water standing above its bed; a point in the slot sends
+// none. The faces out of such a point are scaled down, each face by the
+// point upstream of it, so that water is conserved. Away from the waterline
+// a flux would need a Courant number above 1/2 to be touched.
+void LimitOutflow(int32_t axis);

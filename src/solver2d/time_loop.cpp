@@ -66,6 +66,7 @@ void HalfStep(int32_t axis, int32_t step) {
     StopTiming(gLoop.timing, task);
     StartTiming(gLoop.timing, kTaskOtherCalculation);
 
+    if (gShoreline.type > 0) LimitOutflow(axis);
     if (gFilter.type > 0) axis == 1 ? CalcFilterX() : CalcFilterY();
     if (gSponge.spongeType) AbsorpWaveEnergy();
     CalculateDepth(g.J, g.K, g.depth.data(), g.bed.data(), g.xi.data());

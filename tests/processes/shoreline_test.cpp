@@ -1,10 +1,12 @@
 // The slot of the moving shoreline: its storage width and the effective depth
-// over slot and bed, against the closed forms of the integral of the width.
+// over slot and bed, against the closed forms of the integral of the width;
+// the limit on what a point may lose through a held flux.
 #include "processes/shoreline.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <vector>
 
 #include "solver2d/model_state.hpp"
 
@@ -62,6 +64,43 @@ TEST(SlotDepth, BranchesMeetAtTheBedIntegrateTheWidthAndSpareLandAndDeepBeds) {
     SlotCorrection(depth, bed);
     EXPECT_EQ(depth[0], -0.5f);
     EXPECT_EQ(depth[1], 0.7f);
+    gShoreline = ShorelineSettings{};
+}
+
+TEST(LimitOutflow, NoPointLosesMoreThanHalfItsWaterAndEachFaceKeepsOneValue) {
+    ResetModelState();
+    gShoreline = ShorelineSettings{};
+    GridState& g = gGrid;
+    g.J = 6, g.K = 4, g.dx = 0.5f, g.dy = 0.25f, g.dt = 0.1;
+    g.bed.assign(g.Points(), -1.0f);
+    g.xi.assign(g.Points(), 0.0f);
+    g.P.assign(g.Points(), 0.02f);  // 0.02 m2/s east: a Courant number of 0.002, untouched
+    g.Q.assign(g.Points(), -0.02f);
+    const size_t dry = g.At(2, 2), thin = g.At(4, 2);
+    g.bed[dry] = 0.1f;                  // in the slot: 0.1 m under its bed
+    g.bed[thin] = -0.01f;               // 1 cm of water above its bed
+    g.P[thin - 1] = -0.05f;             // it loses westwards and eastwards
+    const std::vector<float> P0 = g.P, Q0 = g.Q;
+    LimitOutflow(1);
+    // The dry point sends nothing east; it still takes what comes from the west.
+    EXPECT_EQ(g.P[dry], 0.0f);
+    EXPECT_EQ(g.P[dry - 1], P0[dry - 1]);
+    // The thin point sends out half its water over the half step: the sum of
+    // its outflows is 0.5 * 0.01 * dx / (dt/2), shared in proportion.
+    const double out = -static_cast<double>(g.P[thin - 1]) + g.P[thin];
+    EXPECT_NEAR(out, 0.5 * 0.01 * 0.5 / 0.05, 1e-6);
+    EXPECT_NEAR(g.P[thin] / -g.P[thin - 1], 0.02 / 0.05, 1e-6);
+    // Everything else as it was, to the bit, and Q is not touched.
+    for (size_t p = 0; p < g.Points(); ++p) {
+        if (p != dry && p != thin && p != thin - 1) {
+            EXPECT_EQ(g.P[p], P0[p]) << p;
+        }
+    }
+    EXPECT_EQ(g.Q, Q0);
+    // Along y the same with dy: the dry point sends nothing south.
+    LimitOutflow(2);
+    EXPECT_EQ(g.Q[dry - g.Stride()], 0.0f);
+    EXPECT_EQ(g.Q[dry], Q0[dry]);
     gShoreline = ShorelineSettings{};
 }
 

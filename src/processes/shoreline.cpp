@@ -80,6 +80,8 @@ void SlotCorrection(float* target, const float* bed) {
 // water allows, deep into the slot in one half step, and the next sweep
 // would take the depth of that surface near 0. The limit keeps such a point
 // from losing more than it holds.
+constexpr double kOutflowShare = 0.25;  // of the water a point holds, a half step
+
 void LimitOutflow(int32_t axis) {
     GridState& g = gGrid;
     ShorelineSettings& s = gShoreline;
@@ -89,7 +91,7 @@ void LimitOutflow(int32_t axis) {
     float* F = axis == 1 ? g.P.data() : g.Q.data();
     const size_t along = axis == 1 ? 1 : stride;
     // Water above the bed that may leave over the half step, as a flux sum.
-    const double scale = 0.5 * (axis == 1 ? g.dx : g.dy) / (0.5 * g.dt);
+    const double scale = kOutflowShare * (axis == 1 ? g.dx : g.dy) / (0.5 * g.dt);
     const float* xi = g.xi.data();
     const float* bed = g.bed.data();
     const int32_t J = g.J, K = g.K;

@@ -33,8 +33,8 @@ float StorageWidthAt(int32_t j, int32_t k, float surface);
 void SlotCorrection(float* target, const float* bed);
 // After the sweep of the axis (1: P, 2: Q): no point may send out through
 // that flux, over the half step in which the other sweep holds it, more
-// than half of the water standing above its bed; a point in the slot sends
-// none. The faces out of such a point are scaled down, each face by the
-// point upstream of it, so that water is conserved. Away from the waterline
-// a flux would need a Courant number above 1/2 to be touched.
+// than a quarter of the water standing above its bed; a point in the slot
+// sends none. The faces out of such a point are scaled down, each face by
+// the point upstream of it, so that water is conserved. Away from the
+// waterline a flux would need a Courant number above 1/4 to be touched.
 void LimitOutflow(int32_t axis);

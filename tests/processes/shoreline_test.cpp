@@ -67,14 +67,14 @@ TEST(SlotDepth, BranchesMeetAtTheBedIntegrateTheWidthAndSpareLandAndDeepBeds) {
     gShoreline = ShorelineSettings{};
 }
 
-TEST(LimitOutflow, NoPointLosesMoreThanHalfItsWaterAndEachFaceKeepsOneValue) {
+TEST(LimitOutflow, NoPointLosesMoreThanAQuarterOfItsWaterAndEachFaceKeepsOneValue) {
     ResetModelState();
     gShoreline = ShorelineSettings{};
     GridState& g = gGrid;
     g.J = 6, g.K = 4, g.dx = 0.5f, g.dy = 0.25f, g.dt = 0.1;
     g.bed.assign(g.Points(), -1.0f);
     g.xi.assign(g.Points(), 0.0f);
-    g.P.assign(g.Points(), 0.02f);  // 0.02 m2/s east: a Courant number of 0.002, untouched
+    g.P.assign(g.Points(), 0.02f);  // 0.02 m2/s east in 1 m: a Courant number of 0.004, untouched
     g.Q.assign(g.Points(), -0.02f);
     const size_t dry = g.At(2, 2), thin = g.At(4, 2);
     g.bed[dry] = 0.1f;                  // in the slot: 0.1 m under its bed
@@ -85,10 +85,10 @@ TEST(LimitOutflow, NoPointLosesMoreThanHalfItsWaterAndEachFaceKeepsOneValue) {
     // The dry point sends nothing east; it still takes what comes from the west.
     EXPECT_EQ(g.P[dry], 0.0f);
     EXPECT_EQ(g.P[dry - 1], P0[dry - 1]);
-    // The thin point sends out half its water over the half step: the sum of
-    // its outflows is 0.5 * 0.01 * dx / (dt/2), shared in proportion.
+    // The thin point sends out a quarter of its water over the half step: the
+    // sum of its outflows is 0.25 * 0.01 * dx / (dt/2), shared in proportion.
     const double out = -static_cast<double>(g.P[thin - 1]) + g.P[thin];
-    EXPECT_NEAR(out, 0.5 * 0.01 * 0.5 / 0.05, 1e-6);
+    EXPECT_NEAR(out, 0.25 * 0.01 * 0.5 / 0.05, 1e-6);
     EXPECT_NEAR(g.P[thin] / -g.P[thin - 1], 0.02 / 0.05, 1e-6);
     // Everything else as it was, to the bit, and Q is not touched.
     for (size_t p = 0; p < g.Points(); ++p) {

@@ -3,7 +3,9 @@
 #include <omp.h>
 
 #include "output/deterministic.hpp"
+#include "output/disturbance.hpp"
 #include "output/hotstart.hpp"
+#include "output/statistics.hpp"
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
@@ -219,6 +221,18 @@ void Compute(int& exitCode) {
 
     PrepareTimeLoop();
     CreateOutputDeterministic();
+    const bool statistics = gStatisticOutput.type > 0;
+    const bool disturbance = gDisturbanceOutput.type > 0;
+    if (statistics) {
+        InitOutputStatistic();
+        CreateOutputStatistic();
+        WriteOutputStatistic(0);
+    }
+    if (disturbance) {
+        InitOutputDisturbance();
+        CreateOutputDisturbance();
+        WriteOutputDisturbance(0);
+    }
     if (gHotstartOutput.hotStart) WriteOutputHotstart(0);
     StartProgress(1, g.timeStepCount, exitCode);
     if (exitCode < 0) {
@@ -241,6 +255,14 @@ void Compute(int& exitCode) {
 
         StopLoopTasks();
         StartTiming(gOverallTiming, kTaskPostProcessing);
+        if (disturbance) {
+            UpdateOutputDisturbance(n);
+            WriteOutputDisturbance(n);
+        }
+        if (statistics && gStatisticOutput.numberOfRecords > 0) {
+            UpdateOutputStatistic(n);
+            WriteOutputStatistic(n);
+        }
         WriteOutputDeterministic(n);
         if (gHotstartOutput.hotStart) WriteOutputHotstart(n);
         StopTiming(gOverallTiming, kTaskPostProcessing);
@@ -255,6 +277,8 @@ void Compute(int& exitCode) {
     StartTiming(gOverallTiming, kTaskPostProcessing);
     WriteLine("");
     CloseOutputDeterministic();
+    if (statistics) CloseOutputStatistic();
+    if (disturbance) CloseOutputDisturbance();
     WriteTimingReport(gLoop.timing);
     WriteRunStatistics(gOverallTiming, gLoop.stepsDone, gChains.activePoints,
                        static_cast<int64_t>(gLoop.pointSteps));

@@ -103,7 +103,6 @@ void SetupOutputHotstart2D(KvtHandle target) {
 }
 
 const char* UnavailableOutput() {
-    if (gStatisticOutput.type > 0) return "Wave statistics output";
     if (gDisturbanceOutput.type > 0) return "Wave disturbance output";
     return nullptr;
 }

@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "data/tsfunc.hpp"
+#include "output/statistics.hpp"
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
@@ -86,12 +87,13 @@ double BytesPerPoint(int32_t handle) {
 }
 
 // The processes the table switches on, alone or together.
-enum Process : unsigned { kRollers = 1, kEddy = 2, kGeneration = 4 };
+enum Process : unsigned { kRollers = 1, kEddy = 2, kGeneration = 4, kStatistics = 8 };
 
 // Switches on processes of a coastal study on the basin as the model reader
 // would set them up: rollers with their default settings, Smagorinsky eddy
 // viscosity (coefficient 0.2), a generation line along k at j = 10 fed by a
-// sine series.
+// sine series; wave statistics of Type 1 over the whole run (every point
+// starts at its first step, and the first-wave pass still runs), no file.
 void AddProcesses(unsigned which, int32_t steps) {
     const GridState& g = gGrid;
     const size_t n = g.Points();
@@ -115,6 +117,12 @@ void AddProcesses(unsigned which, int32_t steps) {
         e.eddyType = 2;
         e.smagorinskyCoef.assign(n, 0.2f);
         e.eddyViscosity.assign(n, 0.0f);
+    }
+    if (which & kStatistics) {
+        StatisticSettings& s = gStatisticOutput;
+        s = StatisticSettings{};
+        s.type = 1, s.firstWave = 0, s.firstStep = 0, s.lastStep = 1 << 30, s.stepInterval = 1 << 30;
+        InitOutputStatistic();
     }
     if (which & kGeneration) {
         GenerationState& s = gGeneration;
@@ -175,6 +183,11 @@ StepCost MeasureStep(int32_t n, unsigned which, int32_t steps) {
     if (which & kEddy) c.own += PerCall(steps, [](int32_t) { CalcEddyViscosity(); });
     if (which & kGeneration)
         c.own += 2.0 * PerCall(steps, [&](int32_t s) { UpdateInternalGeneration(steps, 1 + s % 2); });
+    if (which & kStatistics) {
+        c.own += PerCall(steps, [](int32_t s) { UpdateOutputStatistic(s + 1); });
+        CloseOutputStatistic();
+        gStatisticOutput = StatisticSettings{};
+    }
     ResetRunState();
     return c;
 }
@@ -182,7 +195,8 @@ StepCost MeasureStep(int32_t n, unsigned which, int32_t steps) {
 // What each process costs a step on one grid, 1 thread, central sweeps: its
 // own routine, and what it adds to the sweeps (its terms, and for eddy
 // viscosity and rollers the assembly of all lines before the solves), beside
-// the step without processes.
+// the step without processes. The wave statistics are called by the time
+// loop after the step, not inside it: their cost is the own routine alone.
 void ProcessTable(int32_t n, double scale) {
     const int32_t steps = std::max(4, static_cast<int32_t>(scale * 1e7 / (double(n) * n)));
     std::printf("\nprocesses on %dx%d, central sweeps, 1 thread, %d steps; ms a step\n", n, n,
@@ -197,7 +211,8 @@ void ProcessTable(int32_t n, double scale) {
                 {"rollers", kRollers},
                 {"Smagorinsky eddy viscosity", kEddy},
                 {"internal generation", kGeneration},
-                {"all three", kRollers | kEddy | kGeneration}};
+                {"all three", kRollers | kEddy | kGeneration},
+                {"wave statistics", kStatistics}};
     for (const auto& row : rows) {
         const StepCost c = row.which == 0 ? bare : MeasureStep(n, row.which, steps);
         std::printf("%-30s %9.2f %9.2f %13.2f %12.0f%%\n", row.name, 1e3 * c.step, 1e3 * c.sweeps,

@@ -4,6 +4,7 @@
 
 #include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
+#include "output/disturbance.hpp"
 #include "run/messages.hpp"
 #include "solver2d/model_state.hpp"
 
@@ -68,6 +69,11 @@ void SetupOutputDisturbance2D(KvtHandle target) {
         KvtGetReal(section, "Incoming_Wave_Height", d.incomingHeight);
     else
         KvtGetIntegerList(section, "Grid_Point", d.gridPoint, 2);
+    if (d.scalingType != 1 && (d.gridPoint[0] < 0 || d.gridPoint[0] > gGrid.J ||
+                               d.gridPoint[1] < 0 || d.gridPoint[1] > gGrid.K))
+        StopRun(Filled(Filled("Output_Disturbance_2D: Grid_Point (%,%) lies outside the grid",
+                              d.gridPoint[0]),
+                       d.gridPoint[1]));
     KvtGetReal(section, "Eps_High", d.epsHigh);
     KvtGetReal(section, "Eps_Low", d.epsLow);
     KvtGetInteger(section, "Number_of_Items", d.numberOfItems);
@@ -76,7 +82,7 @@ void SetupOutputDisturbance2D(KvtHandle target) {
     for (int32_t i = 0; i < d.numberOfItems; ++i) d.itemNumbers[i] = i + 1;
     KvtGetIntegerList(section, "Item_Numbers", d.itemNumbers.data(), d.numberOfItems);
     for (int32_t item : d.itemNumbers)
-        if (item < 1 || item > kDisturbanceItems) StopRun("WriteOutputStatistic: Wrong type of item");
+        if (item < 1 || item > kDisturbanceItems) StopRun("rmsWriteToFile: Wrong type of item");
     d.title = KvtTrimmedString(section, "Title", 40);
     d.fileName = KvtTrimmedFilename(section, "File_Name", 255);
     KvtGetInteger(section, "Type_of_Area_Statistic", d.areaStatistic);
@@ -85,6 +91,7 @@ void SetupOutputDisturbance2D(KvtHandle target) {
         const DataFileRef ref = ReadDataFile(section, 3);
         d.codeMapFile = ref.fileName;
         d.codeMapItem = ref.Item();
+        SetupDisturbanceAreas();
     }
 }
 
@@ -103,6 +110,5 @@ void SetupOutputHotstart2D(KvtHandle target) {
 }
 
 const char* UnavailableOutput() {
-    if (gDisturbanceOutput.type > 0) return "Wave disturbance output";
     return nullptr;
 }

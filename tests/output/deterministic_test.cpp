@@ -196,8 +196,6 @@ TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
          "SetupOutputDeterministic2D: Number_Of_Items of record 1 must be at least 1"},
         {stat, "Type = 1\nTime_Step_Interval = 0\nNumber_Of_Records = 0\n",
          "Output_Statistic_2D: Time_Step_Interval must be at least 1"},
-        {"Output_Disturbance_2D", "Type = 1\nTime_Step_Interval = 10\n",
-         "Wave disturbance output is not yet available in this version"},
     };
     for (const auto& c : cases) {
         const bwtest::RunResult r = Run({{c.section, c.body}});

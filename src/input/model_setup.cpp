@@ -100,14 +100,6 @@ void ReadOptionParameters(KvtHandle target) {
     gProgress.updateInterval = o.hudUpdate2DH;
 }
 
-// The processes and outputs that this version reads and checks but cannot
-// run yet end the run here, after the whole file has been read, so that the
-// log holds every setting and nothing runs half.
-void StopOnUnavailable() {
-    if (const char* name = UnavailableOutput())
-        StopRun(std::string(name) + " is not yet available in this version");
-}
-
 }  // namespace
 
 DataFileRef ReadDataFile(KvtHandle parent, int32_t maxItems) {
@@ -153,5 +145,4 @@ void ReadModelSetup(KvtHandle file, const std::string& /*fileName*/) {
 
     ReadOptionParameters(target);
     ReportSchemeStability();
-    StopOnUnavailable();
 }

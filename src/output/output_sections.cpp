@@ -108,7 +108,3 @@ void SetupOutputHotstart2D(KvtHandle target) {
     KvtGetInteger(section, "Last_Time_Step", h.lastStep);
     KvtGetInteger(section, "Time_Step_Interval", h.stepInterval);
 }
-
-const char* UnavailableOutput() {
-    return nullptr;
-}

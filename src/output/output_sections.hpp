@@ -55,7 +55,3 @@ void SetupOutputDisturbance2D(KvtHandle target);
 // Sets the defaults of first, last and interval to the last step index, then
 // reads the section.
 void SetupOutputHotstart2D(KvtHandle target);
-
-// The name of the first output that is switched on but cannot be written by
-// this version ("Wave statistics output", ...), or nullptr.
-const char* UnavailableOutput();

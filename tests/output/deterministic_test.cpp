@@ -168,7 +168,7 @@ TEST_F(Deterministic, PointsLinesAndAreasHoldTheirItemsOnTheirSubGrids) {
     EXPECT_FLOAT_EQ(values["gauges.xol0"][3][3][0], f[3][4][At(5, 4)]);  // depth at (5,4)
 }
 
-TEST_F(Deterministic, WrongRecordsAndOutputsOfLaterVersionsStop) {
+TEST_F(Deterministic, WrongRecordsStopWithTheirMessages) {
     // A line or area needs ranges inside the grid; a point file names its
     // points one by one; a record needs a step, an item and a point.
     auto one = [](const std::string& file, const std::string& x, const std::string& items,

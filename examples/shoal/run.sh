@@ -24,7 +24,7 @@ end=$(date +%s.%N)
 printf "Done in %.1f s. The log is %s/shoal.log\n\n" "$(echo "$end - $start" | bc)" "$here"
 grep -A6 "Run Statistics" shoal.log | sed -n 2,6p
 echo
-for f in surface.xol2 gauges.xol0 axis.xol1; do
+for f in surface.xol2 gauges.xol0 axis.xol1 waves.xol2; do
     "$bwdata" info "$f" | sed -n '1,3p;/Item name/,/^---/p'
 done
 
@@ -35,8 +35,9 @@ if [ -x "$bwplot" ] && /usr/bin/python3 -c "import matplotlib, netCDF4" 2>/dev/n
     "$bwplot" surface.xol2 --out pictures/surface.png >/dev/null
     "$bwplot" gauges.xol0 --out pictures/gauges.png >/dev/null
     "$bwplot" axis.xol1 --out pictures/axis.png >/dev/null
+    "$bwplot" waves.xol2 --item "Significant wave height" --out pictures/height.png >/dev/null
     echo
-    echo "Pictures: $here/pictures/{bathymetry,surface,gauges,axis}.png"
+    echo "Pictures: $here/pictures/{bathymetry,surface,gauges,axis,height}.png"
 fi
 cat <<TEXT
 

@@ -5,6 +5,7 @@
 #include <cmath>
 #include <numbers>
 
+#include "data/geoframe.hpp"
 #include "data/tsfunc.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/open_boundaries.hpp"
@@ -161,6 +162,28 @@ Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t 
     }
     AddWestBoundary(formulation, series, deep ? across : std::vector<float>{});
     return ch;
+}
+
+void MakeRow(const std::vector<float>& bed, double dt) {
+    ResetModelState();
+    GridState& g = gGrid;
+    g.J = static_cast<int32_t>(bed.size()) - 1, g.K = 0, g.dx = g.dy = 1.0f, g.dt = dt;
+    g.bed = bed;
+    AllocateModelState();
+    GeoFrameOpen(g.frame, "NON-UTM", 0.0, 0.0, 0.0);
+}
+
+void DriveRow(int32_t steps, const std::function<double(int32_t, int32_t)>& surface,
+              const std::function<void(int32_t)>& output) {
+    GridState& g = gGrid;
+    for (int32_t n = 0; n <= steps; ++n) {
+        for (int32_t j = 0; j <= g.J; ++j) {
+            g.xiPrev2[j] = g.xi[j];
+            g.xi[j] = g.bed[j] < 0.0f ? static_cast<float>(surface(j, n)) : 0.0f;
+            g.depth[j] = g.xi[j] - g.bed[j];
+        }
+        output(n);
+    }
 }
 
 }  // namespace bwtest

@@ -62,4 +62,13 @@ struct Channel {
 Channel MakeChannel(int32_t formulation, bool deep, double T, double a, int32_t waves,
                     int32_t periods);
 
+// A row of points (K = 0) 1 m apart with the given beds, time step dt, on
+// a plain local frame; the model state reset.
+void MakeRow(const std::vector<float>& bed, double dt);
+// Sets the row's surface to surface(j, n) (0 on land), its depth with it,
+// for n = 0..steps, and calls output(n) after each: the outputs' start at
+// n = 0, their step after.
+void DriveRow(int32_t steps, const std::function<double(int32_t j, int32_t n)>& surface,
+              const std::function<void(int32_t n)>& output);
+
 }  // namespace bwtest

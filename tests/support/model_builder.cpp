@@ -138,4 +138,33 @@ std::string ModelText(const std::string& bathymetryFile,
     return text + "}\n";
 }
 
+DataFile ReadDataFile(const std::string& path) {
+    DataFile d;
+    XolFile f = XolOpenRead(path);
+    size_t points = 1;
+    for (int a = 0; a < f.dimension; ++a) points *= static_cast<size_t>(f.axes[a].count);
+    std::vector<float> skip(points);
+    if (f.noStaticItems > 0) d.firstStatic.resize(points);
+    for (int s = 0; s < f.noStaticItems; ++s) XolReadStatic(f, s ? skip.data() : d.firstStatic.data());
+    d.records.resize(static_cast<size_t>(std::max(f.noTimeSteps, 0)));
+    for (auto& record : d.records) {
+        record.assign(static_cast<size_t>(f.noDynamicItems), std::vector<float>(points));
+        for (auto& item : record) XolReadDynamic(f, item.data());
+    }
+    XolClose(f);
+    d.header = f;
+    return d;
+}
+
+RunResult RunModel(const TempDir& dir, int steps, double dt,
+                   std::map<std::string, std::string> sections) {
+    std::ostringstream period;
+    period << "Time_step_count = " << steps << "\nTime_step_interval = " << dt
+           << "\nWarm_up_period = 0\nStart_time = 2004, 1, 1, 0, 0, 0\n";
+    sections["Simulation_Period"] = period.str();
+    WriteFile(dir / "m.bw", ModelText("bed.xol2", sections));
+    return RunProgram({BuiltProgram("bw"), "m.bw"}, dir.path.string(),
+                      {{"TARN_PROGRESS", "NONE"}, {"OMP_NUM_THREADS", "1"}}, {"BUILDMODE", "TRF"});
+}
+
 }  // namespace bwtest

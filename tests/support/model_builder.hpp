@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "data/xolfile.hpp"
 #include "input/kvt_access.hpp"
 #include "support/test_support.hpp"
 
@@ -57,6 +58,20 @@ std::string DataFileSection(const std::string& file, int item = 1);
 // and 2 of file.
 std::string GenerationRecord(int n, int j1, int k1, int j2, int k2, int waveType,
                              const std::string& file);
+
+// A data file read back: its header, its first static item (if any) and
+// every record of every dynamic item, records[record][item][point].
+struct DataFile {
+    XolFile header;
+    std::vector<float> firstStatic;
+    std::vector<std::vector<std::vector<float>>> records;
+};
+DataFile ReadDataFile(const std::string& path);
+
+// Writes dir/m.bw, ModelText("bed.xol2", sections) with `steps` steps of dt
+// from 2004-01-01 00:00:00, and runs the engine on it in dir.
+RunResult RunModel(const TempDir& dir, int steps, double dt,
+                   std::map<std::string, std::string> sections);
 
 // Writes `sections` as the body of a model file in dir and hands the file's
 // top section to setup (a Setup... function of the model reader).

@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <cmath>
-#include <csignal>
 #include <cstring>
 #include <filesystem>
 #include <sstream>
@@ -184,61 +183,43 @@ TEST_F(HotstartBasin, TheFileHoldsTheStateOfTheLastDueStep) {
         EXPECT_EQ(area8[7][0][p] == kDelete ? kDelete : at8[0][2][p], area8[7][0][p]) << p;
 }
 
-// A write that fails anywhere leaves the former file as it was: the new one
-// goes to a temporary name and replaces the former once whole on disk. A
-// limit on the size of the process's files stands in for a full disk: with
-// its signal ignored the writes fail and the run stops, with it the process
-// is killed in the middle of the write.
+// A write that fails leaves the former file as it was: the new one goes to a
+// temporary name and replaces the former once whole on disk. A temporary
+// name taken by a folder, and a limit on the size of the process's files (its
+// signal ignored) standing in for a full disk, both stop the run.
 TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
     ASSERT_EQ(RunBasin(Span(0, 0)).exitCode, 0);
     const std::string hot = dir / "hot.xol2", temporary = dir / "hot.xol2.tmp";
     const std::string good = bwtest::ReadFile(hot);
-    auto intact = [&](const std::string& what) {
-        EXPECT_EQ(bwtest::ReadFile(hot), good) << what;
-        int status = 0;
-        XolFile f = XolOpenRead(hot, &status);
-        EXPECT_EQ(status, 0) << what;
-        if (status == 0) XolClose(f);
-    };
-    fs::create_directory(temporary);  // the file cannot be created
+    fs::create_directory(temporary);
     bwtest::RunResult r = RunBasin(Span(0, 0));
-    EXPECT_EQ(r.exitCode, 1);
     EXPECT_EQ(r.out, "Unable to create file for " + hot + "\n");
     EXPECT_TRUE(fs::is_directory(temporary));
-    intact("folder");
+    EXPECT_EQ(bwtest::ReadFile(hot), good);
     fs::remove(temporary);
-
     // A limit some 4 kB below the size of the file (the log stays below it).
-    const std::string limit = "ulimit -f " + std::to_string(good.size() / 512 - 8) + ";";
-    r = RunBasin(Span(0, 0), "trap '' XFSZ;" + limit);
+    r = RunBasin(Span(0, 0),
+                 "trap '' XFSZ; ulimit -f " + std::to_string(good.size() / 512 - 8) + ";");
     EXPECT_EQ(r.exitCode, 1);
     EXPECT_EQ(r.out, "Flush error\n");
     EXPECT_TRUE(EndsAbnormally());
     EXPECT_FALSE(fs::exists(temporary));
-    intact("full");
-    r = RunBasin(Span(0, 0), limit);
-    EXPECT_EQ(r.exitCode, 128 + SIGXFSZ);
-    EXPECT_TRUE(fs::exists(temporary));  // left by the kill, replaced by the next write
-    intact("killed");
+    EXPECT_EQ(bwtest::ReadFile(hot), good);
 }
 
-// The reader refuses a file that is not a state file; a state file without
-// all its items stops in the data layer at the first item that is missing.
-TEST_F(HotstartBasin, AFileThatIsNotAStateFileIsRefused) {
+// A state file without all its items stops in the data layer at the first
+// item that is missing (a file that is no state file: the model reader's test).
+TEST_F(HotstartBasin, AStateFileWithoutItsItemsIsRefused) {
     bwtest::MapSpec flagged = grid;
     flagged.dataType = 11;
     bwtest::WriteMapFile(dir / "one.xol2", flagged, bed);
-    for (const auto& [file, out] :
-         {std::pair{"bed.xol2", "XOL data is not hot start data\n"},
-          std::pair{"one.xol2", "TRNXOL Error: Unable to read dynamic item\n"}}) {
-        const bwtest::RunResult r =
-            Run("m", file,
-                {{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection(file)},
-                 {"SURFACE_ELEVATION", "-"}});
-        EXPECT_EQ(r.exitCode, 1) << file;
-        EXPECT_EQ(r.out, out);
-        EXPECT_TRUE(EndsAbnormally()) << file;
-    }
+    const bwtest::RunResult r =
+        Run("m", "one.xol2",
+            {{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection("one.xol2")},
+             {"SURFACE_ELEVATION", "-"}});
+    EXPECT_EQ(r.exitCode, 1);
+    EXPECT_EQ(r.out, "TRNXOL Error: Unable to read dynamic item\n");
+    EXPECT_TRUE(EndsAbnormally());
 }
 
 // A channel of 31 x 5 points, water in the rows k = 1..3, driven by a level
@@ -286,19 +267,17 @@ protected:
     }
     // The differences of the area items (surface, P, Q, roller thickness)
     // between the second run and the unbroken one: the largest over the
-    // second run and at its end, and whether all agree to the last bit.
+    // second run, and whether all agree to the last bit.
     struct Split {
-        float most[4] = {0, 0, 0, 0}, end[4] = {0, 0, 0, 0};
+        float most[4] = {0, 0, 0, 0};
         bool identical = true;
         float waveHeight = 0;  // the largest surface range at a point of the unbroken run
         float flux = 0;        // the largest |P| of the unbroken run
         std::string Text() const {
             std::ostringstream s;
-            s << "wave height " << waveHeight << " m, largest P " << flux
-              << " m2/s; differences (at the end):";
+            s << "wave height " << waveHeight << " m, largest P " << flux << " m2/s; differences:";
             const char* names[] = {"xi", "P", "Q", "delta"};
-            for (int i = 0; i < 4; ++i)
-                s << " " << names[i] << " " << most[i] << " (" << end[i] << ")";
+            for (int i = 0; i < 4; ++i) s << " " << names[i] << " " << most[i];
             return s.str();
         }
     };
@@ -310,8 +289,7 @@ protected:
         second["Bathymetry_Selection"] =
             "Hot_Start = true\n" + bwtest::DataFileSection("half.xol2");
         second["SURFACE_ELEVATION"] = "-";
-        const int start = static_cast<int>(std::lround(n1 * kDt));
-        EXPECT_NEAR(start, n1 * kDt, 1e-9) << "the second run must start on a whole second";
+        const int start = static_cast<int>(std::lround(n1 * kDt));  // n1 on a whole second
         r = Run("second", "half.xol2", Model(steps - n1, start, "second.xol2", second));
         EXPECT_EQ(r.exitCode, 0) << r.out;
         const Records whole = ReadRecords(dir / "whole.xol2"),
@@ -326,10 +304,8 @@ protected:
             for (int i = 0; i < 4; ++i) {
                 const std::vector<float>&a = whole[n1 + m][i], &b = rest[m][i];
                 d.identical = d.identical && std::memcmp(a.data(), b.data(), a.size() * 4) == 0;
-                for (size_t p = 0; p < a.size(); ++p) {
+                for (size_t p = 0; p < a.size(); ++p)
                     d.most[i] = std::max(d.most[i], std::fabs(a[p] - b[p]));
-                    if (m + 1 == rest.size()) d.end[i] = std::max(d.end[i], std::fabs(a[p] - b[p]));
-                }
             }
         for (size_t p = 0; p < bed.size(); ++p) {
             float low = 1e30f, high = -1e30f;
@@ -365,7 +341,7 @@ protected:
 // both take the lines of the next step in the same order). A boundary on the
 // west edge keeps the flux across it in a row outside the fields, which the
 // file does not hold, so the second run starts it at 0. Measured: surface
-// 2.2 mm (1.1 mm at the end) in waves of 94 mm, P 0.017 m2/s (0.009) of 0.15.
+// 2.2 mm in waves of 94 mm, P 0.017 m2/s of 0.15.
 TEST_F(HotstartChannel, ARunSplitInTwoGoesOnBitForBitButForAWestBoundary) {
     Split d = RunSplit(60, 20, {});
     EXPECT_TRUE(d.identical) << d.Text();
@@ -380,8 +356,8 @@ TEST_F(HotstartChannel, ARunSplitInTwoGoesOnBitForBitButForAWestBoundary) {
 // Split while waves break on the beach: the file holds the roller fields but
 // not xiPrev2, which the first roller pass of the second run reads as 1e-10,
 // so it lays rollers wherever the surface stands above tanPhi |c| dt.
-// Measured: surface 11 mm (8 mm at the end) in waves of 204 mm, P 0.023 m2/s
-// (0.014) of 0.24, roller thickness 7 mm (3 mm).
+// Measured: surface 11 mm in waves of 204 mm, P 0.023 m2/s of 0.24, roller
+// thickness 7 mm.
 TEST_F(HotstartChannel, ARestartDuringBreakingDiffersByLittle) {
     amplitude = 0.09, period = 1.5;
     WriteChannel(true);
@@ -393,7 +369,6 @@ TEST_F(HotstartChannel, ARestartDuringBreakingDiffersByLittle) {
         << "no roller at the split";
     EXPECT_GT(d.most[3], 0.0f);
     EXPECT_LT(d.most[0], 0.08f * d.waveHeight) << d.Text();
-    EXPECT_LT(d.end[0], 0.06f * d.waveHeight) << d.Text();
     EXPECT_LT(d.most[1], 0.15f * d.flux) << d.Text();
     EXPECT_LT(d.most[3], 0.05f * d.waveHeight) << d.Text();
 }
@@ -401,7 +376,7 @@ TEST_F(HotstartChannel, ARestartDuringBreakingDiffersByLittle) {
 // The file holds the sources of the present and the last half step. A line
 // fed by a series also keeps the half-step value of its record, which the
 // second run starts at 0, halving its first source value. Measured: surface
-// 1.4 mm (0.5 mm at the end) in waves of 94 mm, P 0.003 m2/s. A line file is
+// 1.4 mm in waves of 94 mm, P 0.003 m2/s. A line file is
 // read afresh from the second run's start and agrees to rounding (5e-8 m).
 TEST_F(HotstartChannel, ARestartWithInternalGeneration) {
     const double c = std::sqrt(9.81);  // a = s/c in 1 m of water

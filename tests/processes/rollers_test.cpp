@@ -117,40 +117,32 @@ TEST_F(Rollers, PorousSpongeDryAndSourcePointsNeverBreakAndNoRollerIsThickerThan
     EXPECT_GT(Speed(source), 0.0);
     EXPECT_GT(gRollers.delta[open], 0.0f);
     EXPECT_EQ(gRollers.delta[low], g.depth[low]);  // limited by the total depth
-    for (int step = 0; step < 5; ++step) {
-        CalcBreaking(nullptr, 1 + step % 2);
-        for (size_t p = 0; p < g.Points(); ++p)
-            ASSERT_LE(gRollers.delta[p], std::max(g.depth[p], 0.0f)) << p;
-    }
 }
 
 TEST_F(Rollers, TheCelerityGrowsFromC0AsTheSlopeRelaxesAndKeepsItsLastValueOnAFlatSea) {
     // A surface rising steadily keeps every point breaking; the slope relaxes
     // by (dt/2) ln2/half_time a half step, half its way in half_time.
-    for (double factor : {1.3, 1.0}) {
-        Make(8, 4, -1.0f,
-             "velocity_type = 4\nhalf_time = 0.5\nvelocity_factor = " + std::to_string(factor) +
-                 "\n");
-        GridState& g = gGrid;
-        const RollerSettings& r = gRollers;
-        const size_t p = g.At(4, 2);
-        Rise(0.2f);
-        for (int32_t k = 1; k < g.K; ++k)  // a slope along x for the gradient
-            for (int32_t j = 1; j < g.J; ++j) g.xi[g.At(j, k)] = 0.2f + 0.01f * j;
-        std::vector<double> speeds;
-        for (int n = 0; n < 20; ++n) {  // 20 x 0.025 s = half_time
-            CalcBreaking(nullptr, 1 + n % 2);
-            speeds.push_back(Speed(p));
-        }
-        EXPECT_NEAR((r.tanPhi[p] - r.tanFinal) / (r.tanInitial - r.tanFinal), 0.5, 0.02);
-        // c0 from the initial slope, then half way to velocity_factor c0.
-        EXPECT_NEAR(speeds.front(), kC0, 1e-5);
-        EXPECT_NEAR(speeds.back(), kC0 * (1.0 + 0.5 * (factor - 1.0)), 0.02 * kC0);
-        EXPECT_TRUE(std::is_sorted(speeds.begin(), speeds.end()));
+    const double factor = 1.6;  // not the default 1.3
+    Make(8, 4, -1.0f, "velocity_type = 4\nhalf_time = 0.5\nvelocity_factor = 1.6\n");
+    GridState& g = gGrid;
+    const RollerSettings& r = gRollers;
+    size_t p = g.At(4, 2);
+    Rise(0.2f);
+    for (int32_t k = 1; k < g.K; ++k)  // a slope along x for the gradient
+        for (int32_t j = 1; j < g.J; ++j) g.xi[g.At(j, k)] = 0.2f + 0.01f * j;
+    std::vector<double> speeds;
+    for (int n = 0; n < 20; ++n) {  // 20 x 0.025 s = half_time
+        CalcBreaking(nullptr, 1 + n % 2);
+        speeds.push_back(Speed(p));
     }
+    EXPECT_NEAR((r.tanPhi[p] - r.tanFinal) / (r.tanInitial - r.tanFinal), 0.5, 0.02);
+    // c0 from the initial slope, then half way to velocity_factor c0.
+    EXPECT_NEAR(speeds.front(), kC0, 1e-5);
+    EXPECT_NEAR(speeds.back(), kC0 * (1.0 + 0.5 * (factor - 1.0)), 0.02 * kC0);
+    EXPECT_TRUE(std::is_sorted(speeds.begin(), speeds.end()));
     // A flat sea at rest: type 1 keeps the last direction, at the length c0.
     Make(8, 4, -1.0f, "");
-    const size_t p = gGrid.At(4, 2);
+    p = gGrid.At(4, 2);
     gRollers.cx[p] = -0.7f, gRollers.cy[p] = 0.4f;
     CalcBreaking(nullptr, 2);
     const double L = std::hypot(0.7, 0.4);

@@ -206,9 +206,7 @@ TEST_F(StatisticsRun, OnlineSumsAgreeWithTheStoredSeriesOfTheSameRun) {
     EXPECT_EQ(f.dynamicItems[41].name, "P(8,5): Time of first wave");
     EXPECT_EQ(areaFile.header.noStaticItems, 1);
     EXPECT_EQ(areaFile.header.dynamicItems[2].name, "Filt. elevation");
-    const std::string log = bwtest::ReadFile(dir / "m.log");
-    EXPECT_NE(log.find("  Title  : stat.xol0\n"), std::string::npos);
-    EXPECT_NE(log.find("  Title  : stat.xol2\n"), std::string::npos);
+    EXPECT_NE(bwtest::ReadFile(dir / "m.log").find("  Title  : stat.xol2\n"), std::string::npos);
 
     const Records &stats = statFile.records, &area = areaFile.records;
     const Records series = bwtest::ReadDataFile(dir / "series.xol0").records;
@@ -320,7 +318,6 @@ TEST(StatisticsRules, RestartsDryPointsAndPointsWithoutVariance) {
     EXPECT_EQ(r[1][3][1], kDelete);
     EXPECT_EQ(r[2][3][1], kDelete);
     EXPECT_EQ(r[2][5][1], 0.1f);  // the time of first wave stays
-    ExpectItems(r[2], 0, Expected(Jumpy, 1, 12), "type 2, moving point");
     r = RunRow(2, 2, 4, 0, 12, surface);
     ExpectItems(r[2], 1, Expected(Jumpy, 1, 12, 6), "type 2, mean calculation 2");
     EXPECT_FLOAT_EQ(r[2][0][3], 1e-4f);

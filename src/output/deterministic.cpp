@@ -197,6 +197,26 @@ void SetupOutputDeterministic2D(KvtHandle target) {
         ReadOutputSpec(section, n, OutputSpecKeys{}, gOutputDet.records[n - 1]);
 }
 
+void SetStepTimeAxis(XolFile& file, int32_t startStep, int32_t stepInterval) {
+    const GridState& g = gGrid;
+    // The text holds whole seconds; a start between them goes into the offset.
+    const DateTime start = AddSeconds(g.start, startStep * g.dt);
+    const double fraction = start.seconds - std::floor(start.seconds);
+    XolSetCalendarAxis(file, stepInterval * g.dt, DateTimeText(start), 1400, fraction);
+}
+
+GridPlace SetGridProjection(XolFile& file, double x, double y) {
+    const GridState& g = gGrid;
+    GridPlace place;
+    std::string projection;
+    GeoFrameXy2Geo(g.frame, x, y, place.longitude, place.latitude);
+    GeoFrameGetTrueNorth(g.frame, x, y, place.north);
+    place.north += 0.0;  // no negative zero in the file
+    GeoFrameGetProjectionString(g.frame, projection);
+    XolSetProjection(file, projection, place.longitude, place.latitude, place.north);
+    return place;
+}
+
 void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int32_t startStep,
                             int32_t stepInterval, int32_t dataType) {
     const GridState& g = gGrid;
@@ -225,20 +245,10 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
             XolSetItem(r.file, n++, info.type, name, info.unit);
         }
     }
-    // The text holds whole seconds; a start between them goes into the offset.
-    const DateTime start = AddSeconds(g.start, startStep * g.dt);
-    const double fraction = start.seconds - std::floor(start.seconds);
-    XolSetCalendarAxis(r.file, stepInterval * g.dt, DateTimeText(start), 1400, fraction);
+    SetStepTimeAxis(r.file, startStep, stepInterval);
     XolSetMisc(r.file, 4, g.landValue);
     if (r.dimension == 2) {
-        const double x = s.j0 * static_cast<double>(g.dx), y = s.k0 * static_cast<double>(g.dy);
-        double lon = 0.0, lat = 0.0, north = 0.0;
-        std::string projection;
-        GeoFrameXy2Geo(g.frame, x, y, lon, lat);
-        GeoFrameGetTrueNorth(g.frame, x, y, north);
-        north += 0.0;  // no negative zero in the file
-        GeoFrameGetProjectionString(g.frame, projection);
-        XolSetProjection(r.file, projection, lon, lat, north);
+        SetGridProjection(r.file, s.j0 * static_cast<double>(g.dx), s.k0 * static_cast<double>(g.dy));
     } else {
         XolSetMisc(r.file, 1, 0.0f);
     }

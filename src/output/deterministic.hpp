@@ -86,3 +86,13 @@ int32_t RecordPoints(const OutputRecord2D& r);
 // "Bathymetry" (with the delete value on land when the record's Type_Of_Land is 1).
 void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int32_t startStep,
                             int32_t stepInterval, int32_t dataType);
+// The calendar time axis of a map file whose first record is step
+// startStep, with stepInterval steps between records.
+void SetStepTimeAxis(XolFile& file, int32_t startStep, int32_t stepInterval);
+// The projection of a map file whose origin lies at (x, y) metres from grid
+// point (0,0): the grid's projection, the geographical position of that
+// place and the true north there, which it returns.
+struct GridPlace {
+    double longitude = 0.0, latitude = 0.0, north = 0.0;
+};
+GridPlace SetGridProjection(XolFile& file, double x, double y);

@@ -8,7 +8,6 @@
 #include <new>
 #include <string>
 
-#include "data/geoframe.hpp"
 #include "run/datetime.hpp"
 #include "run/messages.hpp"
 #include "run/units.hpp"
@@ -201,18 +200,9 @@ void CreateOutputDisturbance() {
         const OutputItemInfo& info = kDisturbanceItemInfo[item - 1];
         XolSetItem(s.file, n++, info.type, info.name, info.unit);
     }
-    // The text holds whole seconds; a start between them goes into the offset.
-    const DateTime start = AddSeconds(g.start, (d.firstStep + d.stepInterval) * g.dt);
-    const double fraction = start.seconds - std::floor(start.seconds);
-    XolSetCalendarAxis(s.file, d.stepInterval * g.dt, DateTimeText(start), 1400, fraction);
+    SetStepTimeAxis(s.file, d.firstStep + d.stepInterval, d.stepInterval);
     XolSetMisc(s.file, 4, g.landValue);
-    double lon = 0.0, lat = 0.0, north = 0.0;
-    std::string projection;
-    GeoFrameXy2Geo(g.frame, 0.0, 0.0, lon, lat);
-    GeoFrameGetTrueNorth(g.frame, 0.0, 0.0, north);
-    north += 0.0;  // no negative zero in the file
-    GeoFrameGetProjectionString(g.frame, projection);
-    XolSetProjection(s.file, projection, lon, lat, north);
+    SetGridProjection(s.file, 0.0, 0.0);
     int status = 0;
     XolCreateFile(s.file, d.fileName, &status);
     if (status != 0) StopRun("Unable to open " + d.fileName);

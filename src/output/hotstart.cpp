@@ -21,7 +21,6 @@
 #include <cstdio>
 #include <new>
 
-#include "data/geoframe.hpp"
 #include "data/xolfile.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/rollers.hpp"
@@ -133,16 +132,9 @@ void WriteOutputHotstart(int32_t step) {
     }
     XolSetMisc(f, 4, g.landValue);
     XolSetDataType(f, kHotstartDataType);
-    double lon = 0.0, lat = 0.0, north = 0.0;
-    std::string projection;
-    GeoFrameXy2Geo(g.frame, 0.0, 0.0, lon, lat);
-    GeoFrameGetTrueNorth(g.frame, 0.0, 0.0, north);
-    north += 0.0;  // no negative zero in the file
-    GeoFrameGetProjectionString(g.frame, projection);
-    XolSetProjection(f, projection, lon, lat, north);
-    // The text holds whole seconds; a start between them goes into the offset.
+    const GridPlace origin = SetGridProjection(f, 0.0, 0.0);
+    SetStepTimeAxis(f, step, 1);
     const DateTime date = AddSeconds(g.start, step * g.dt);
-    XolSetCalendarAxis(f, g.dt, DateTimeText(date), 1400, date.seconds - std::floor(date.seconds));
 
     const std::string temporary = HotstartTemporaryName(h.fileName);
     int status = 0;
@@ -153,7 +145,7 @@ void WriteOutputHotstart(int32_t step) {
         if (status != 0) Abandon(f, temporary, "TRNXOL Error: " + XolErrorText(status));
     };
 
-    FillScalars(v, date, lat, north);
+    FillScalars(v, date, origin.latitude, origin.north);
     write(v.data());
     for (const Field* field :
          {&g.bed, &g.xi, &g.P, &g.Q, &g.xiPrev, &g.PPrev, &g.QPrev, &g.pxyt, &g.qxyt})

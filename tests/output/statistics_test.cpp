@@ -101,9 +101,9 @@ TEST(StatisticsOfAWave, AProgressiveSineHasTheHeightExtremesLevelAndTransportOfT
     }
 }
 
-// An Output_Spec_Data_% section.
-std::string Spec(int n, const std::string& file, const std::string& x, const std::string& y,
-                 const std::string& items, const std::string& extra = "") {
+// The section of output record n: its file, ranges and items.
+std::string RecordSection(int n, const std::string& file, const std::string& x, const std::string& y,
+                          const std::string& items, const std::string& extra = "") {
     std::ostringstream s;
     s << "Output_Spec_Data_" << n << " {\nFile_Name = file(\"" << file
       << "\")\nX_Range_And_Interval = " << x << "\nY_Range_And_Interval = " << y
@@ -183,12 +183,12 @@ TEST_F(StatisticsRun, OnlineSumsAgreeWithTheStoredSeriesOfTheSameRun) {
     const std::string stat =
         "Type = 2\nType_of_mean_calculation = 1\nFirst_Time_step = 0\nLast_Time_step = 60\n"
         "Time_Step_Interval = 20\nNumber_of_First_Wave = 1\nNumber_Of_Records = 2\n" +
-        Spec(1, "stat.xol0", gauges, rows, "1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14",
+        RecordSection(1, "stat.xol0", gauges, rows, "1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14",
              points) +
-        Spec(2, "stat.xol2", "0, 10, 1", "0, 8, 1", "1, 5, 15");
+        RecordSection(2, "stat.xol2", "0, 10, 1", "0, 8, 1", "1, 5, 15");
     const std::string det =
         "Number_Of_Records = 1\n" +
-        Spec(1, "series.xol0", gauges, rows, "1, 2, 3, 4",
+        RecordSection(1, "series.xol0", gauges, rows, "1, 2, 3, 4",
              points + "First_Time_step = 0\nLast_Time_step = 60\nTime_Step_Interval = 1\n");
     const bwtest::RunResult run =
         Run({{"Output_Statistic_2D", stat}, {"Output_Deterministic_2D", det}});
@@ -353,14 +353,14 @@ TEST_F(StatisticsRun, WrongRecordsStopWithTheirMessages) {
          {std::tuple{"stat.dt3", "1", "SetupOutputDeterministic2D: Wrong file extension"},
           std::tuple{"stat.xol2", "1, 18", "WriteOutputStatistic: Wrong type of item"}}) {
         const bwtest::RunResult r =
-            Run({{"Output_Statistic_2D", head + Spec(1, file, "0, 10, 1", "0, 8, 1", items)}});
+            Run({{"Output_Statistic_2D", head + RecordSection(1, file, "0, 10, 1", "0, 8, 1", items)}});
         EXPECT_EQ(r.exitCode, 1) << message;
         EXPECT_EQ(r.out, std::string(message) + "\n");
     }
     // A Type of 0 writes nothing, whatever records follow.
     const bwtest::RunResult r =
         Run({{"Output_Statistic_2D", "Type = 0\nNumber_Of_Records = 1\n" +
-                                         Spec(1, "none.xol2", "0, 10, 1", "0, 8, 1", "1")}});
+                                         RecordSection(1, "none.xol2", "0, 10, 1", "0, 8, 1", "1")}});
     EXPECT_EQ(r.exitCode, 0) << r.out;
     EXPECT_FALSE(std::filesystem::exists(dir / "none.xol2"));
 }

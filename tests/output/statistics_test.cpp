@@ -102,8 +102,9 @@ TEST(StatisticsOfAWave, AProgressiveSineHasTheHeightExtremesLevelAndTransportOfT
 }
 
 // The section of output record n: its file, ranges and items.
-std::string RecordSection(int n, const std::string& file, const std::string& x, const std::string& y,
-                          const std::string& items, const std::string& extra = "") {
+std::string RecordSection(int n, const std::string& file, const std::string& x,
+                          const std::string& y, const std::string& items,
+                          const std::string& extra = "") {
     std::ostringstream s;
     s << "Output_Spec_Data_" << n << " {\nFile_Name = file(\"" << file
       << "\")\nX_Range_And_Interval = " << x << "\nY_Range_And_Interval = " << y

@@ -13,20 +13,27 @@
 
 DeterministicOutput gOutputDet;
 
-const OutputItemInfo kDeterministicItems[12] = {
-    {"Surface elevation", 100078, 1000},    {"Water depth", 100280, 1000},
-    {"P flux", 100080, 4700},               {"Q flux", 100080, 4700},
-    {"Roller thickness", 100299, 1000},     {"Roller angle", 999, 1000},
-    {"Roller celerity, cx", 100016, 2000},  {"Roller celerity, cy", 100016, 2000},
-    {"Still water depth", 100280, 1000},    {"Water level (roller)", 100000, 1000},
-    {"U velerity", 100016, 2000},           {"V velerity", 100016, 2000}};
+const OutputItemInfo kDeterministicItems[12] = {{"Surface elevation", 100078, 1000},
+                                                {"Water depth", 100280, 1000},
+                                                {"P flux", 100080, 4700},
+                                                {"Q flux", 100080, 4700},
+                                                {"Roller thickness", 100299, 1000},
+                                                {"Roller angle", 999, 1000},
+                                                {"Roller celerity, cx", 100016, 2000},
+                                                {"Roller celerity, cy", 100016, 2000},
+                                                {"Still water depth", 100280, 1000},
+                                                {"Water level (roller)", 100000, 1000},
+                                                {"U velerity", 100016, 2000},
+                                                {"V velerity", 100016, 2000}};
 
 namespace {
 
 constexpr const char* kWrongItem = "WriteOutputStatistic: Wrong type of item";
 
 // A roller field, or 0 where the run has no rollers.
-float Roller(const std::vector<float>& field, size_t at) { return field.empty() ? 0.0f : field[at]; }
+float Roller(const std::vector<float>& field, size_t at) {
+    return field.empty() ? 0.0f : field[at];
+}
 
 // The value of item at grid point (j,k), the delete value where it has none.
 float ItemValue(int32_t item, int32_t j, int32_t k) {
@@ -35,18 +42,27 @@ float ItemValue(int32_t item, int32_t j, int32_t k) {
     const size_t at = g.At(j, k);
     const bool dry = g.bed[at] - g.xi[at] >= 0.0f;
     switch (item) {
-        case 1: return dry ? kDeleteValue : g.xi[at];
-        case 2: return dry ? kDeleteValue : g.xi[at] - g.bed[at];
-        case 3: return dry ? kDeleteValue : g.P[at];
-        case 4: return dry ? kDeleteValue : g.Q[at];
-        case 5: return dry ? kDeleteValue : Roller(ro.delta, at);
+        case 1:
+            return dry ? kDeleteValue : g.xi[at];
+        case 2:
+            return dry ? kDeleteValue : g.xi[at] - g.bed[at];
+        case 3:
+            return dry ? kDeleteValue : g.P[at];
+        case 4:
+            return dry ? kDeleteValue : g.Q[at];
+        case 5:
+            return dry ? kDeleteValue : Roller(ro.delta, at);
         case 6:
             return dry ? kDeleteValue
                        : static_cast<float>(std::atan(Roller(ro.tanPhi, at)) / 0.017453292f);
-        case 7: return dry ? kDeleteValue : Roller(ro.cx, at);
-        case 8: return dry ? kDeleteValue : Roller(ro.cy, at);
-        case 9: return g.bed[at] >= g.landValue ? kDeleteValue : g.bed[at];
-        case 10: return Roller(ro.delta, at) > 1e-10f ? g.xi[at] - g.bed[at] : kDeleteValue;
+        case 7:
+            return dry ? kDeleteValue : Roller(ro.cx, at);
+        case 8:
+            return dry ? kDeleteValue : Roller(ro.cy, at);
+        case 9:
+            return g.bed[at] >= g.landValue ? kDeleteValue : g.bed[at];
+        case 10:
+            return Roller(ro.delta, at) > 1e-10f ? g.xi[at] - g.bed[at] : kDeleteValue;
         case 11: {
             if (g.bed[at] >= 0.0f) return kDeleteValue;
             const double west = j > 0 ? g.P[at - 1] : g.PWest[k];
@@ -58,10 +74,12 @@ float ItemValue(int32_t item, int32_t j, int32_t k) {
                 return static_cast<float>((static_cast<double>(g.Q[at]) + g.QSouth[j]) * 0.5 /
                                           g.depth[at]);
             const size_t south = at - g.Stride();
-            const double sum = static_cast<double>(g.Q[at]) + g.Q[south] + g.QPrev[at] + g.QPrev[south];
+            const double sum =
+                static_cast<double>(g.Q[at]) + g.Q[south] + g.QPrev[at] + g.QPrev[south];
             return static_cast<float>(sum * 0.25 / g.depth[at]);
         }
-        default: StopRun(kWrongItem);
+        default:
+            StopRun(kWrongItem);
     }
 }
 
@@ -111,7 +129,9 @@ int32_t OutputTypeFromExtension(const std::string& fileName) {
     return -1;
 }
 
-int32_t RecordPoints(const OutputRecord2D& r) { return r.type <= 0 ? r.noOfPoints : 1; }
+int32_t RecordPoints(const OutputRecord2D& r) {
+    return r.type <= 0 ? r.noOfPoints : 1;
+}
 
 OutputSubGrid RecordSubGrid(const OutputRecord2D& r, int32_t point) {
     OutputSubGrid s;
@@ -148,10 +168,11 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
         ReadRange(section, "Y_Range_And_Interval", r.noOfPoints, r.yRange);
         for (int32_t p = 0; p < r.noOfPoints; ++p)
             if (r.xRange[p] < 0 || r.xRange[p] > g.J || r.yRange[p] < 0 || r.yRange[p] > g.K)
-                StopRun(Filled(Filled("SetupOutputDeterministic2D: point % of record % lies outside "
-                                      "the grid",
-                                      p + 1),
-                               number));
+                StopRun(
+                    Filled(Filled("SetupOutputDeterministic2D: point % of record % lies outside "
+                                  "the grid",
+                                  p + 1),
+                           number));
         r.dimension = 0;
     } else {
         r.noOfPoints = 1;
@@ -248,7 +269,8 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
     SetStepTimeAxis(r.file, startStep, stepInterval);
     XolSetMisc(r.file, 4, g.landValue);
     if (r.dimension == 2) {
-        SetGridProjection(r.file, s.j0 * static_cast<double>(g.dx), s.k0 * static_cast<double>(g.dy));
+        SetGridProjection(r.file, s.j0 * static_cast<double>(g.dx),
+                          s.k0 * static_cast<double>(g.dy));
     } else {
         XolSetMisc(r.file, 1, 0.0f);
     }

@@ -12,19 +12,29 @@
 StatisticState gStatistics;
 
 const OutputItemInfo kStatisticItems[kStatisticItemCount] = {
-    {"Significant wave height", 100097, 1000}, {"Max. wave height", 100078, 1000},
-    {"Max. elevation", 100078, 1000},          {"Min. elevation", 100078, 1000},
-    {"Mean elevation", 100078, 1000},          {"Mean flux, P", 100080, 4700},
-    {"Mean flux, Q", 100080, 4700},            {"Mean velocity, U0", 100016, 2000},
-    {"Mean velocity, V0", 100016, 2000},       {"Mean roller thickness", 100299, 1000},
-    {"Skewness", 100294, 99000},               {"Kurtosis", 100297, 99000},
-    {"Atiltness", 100296, 99000},              {"Time of first wave", 100107, 1400},
-    {"Filt. elevation", 100078, 1000},         {"Filt. flux, P", 100016, 2000},
+    {"Significant wave height", 100097, 1000},
+    {"Max. wave height", 100078, 1000},
+    {"Max. elevation", 100078, 1000},
+    {"Min. elevation", 100078, 1000},
+    {"Mean elevation", 100078, 1000},
+    {"Mean flux, P", 100080, 4700},
+    {"Mean flux, Q", 100080, 4700},
+    {"Mean velocity, U0", 100016, 2000},
+    {"Mean velocity, V0", 100016, 2000},
+    {"Mean roller thickness", 100299, 1000},
+    {"Skewness", 100294, 99000},
+    {"Kurtosis", 100297, 99000},
+    {"Atiltness", 100296, 99000},
+    {"Time of first wave", 100107, 1400},
+    {"Filt. elevation", 100078, 1000},
+    {"Filt. flux, P", 100016, 2000},
     {"Filt. flux, Q", 100016, 2000}};
 
 namespace {
 
-bool RollersOn() { return gRollers.type == 1 && !gRollers.delta.empty(); }
+bool RollersOn() {
+    return gRollers.type == 1 && !gRollers.delta.empty();
+}
 
 // Type 1: counts the half waves passing each point that has not started,
 // and starts it at step n when Number_of_First_Wave crests and troughs have
@@ -63,9 +73,9 @@ void RestartSums(int32_t n) {
     std::copy(g.xi.begin(), g.xi.end(), s.etaMin.begin());
     std::fill(s.samples.begin(), s.samples.end(), 0);
     std::fill(s.firstStep.begin(), s.firstStep.end(), n);
-    for (std::vector<float>* v : {&s.sumEta, &s.sumEta2, &s.sumEta3, &s.sumEta4, &s.sumRate,
-                                  &s.sumRate2, &s.sumRate3, &s.sumP, &s.sumQ, &s.sumU, &s.sumV,
-                                  &s.sumDelta})
+    for (std::vector<float>* v :
+         {&s.sumEta, &s.sumEta2, &s.sumEta3, &s.sumEta4, &s.sumRate, &s.sumRate2, &s.sumRate3,
+          &s.sumP, &s.sumQ, &s.sumU, &s.sumV, &s.sumDelta})
         std::fill(v->begin(), v->end(), 0.0f);
 }
 
@@ -121,7 +131,8 @@ void AddSamples() {
             s2[p] += add(x2);
             s3[p] += add(x2 * x);
             s4[p] += add(x2 * x2);
-            const double r = wet ? (static_cast<double>(x) - static_cast<double>(prev2[p])) / dt : 0.0;
+            const double r =
+                wet ? (static_cast<double>(x) - static_cast<double>(prev2[p])) / dt : 0.0;
             r1[p] = static_cast<float>(r1[p] + r);
             r2[p] = static_cast<float>(r2[p] + r * r);
             r3[p] = static_cast<float>(r3[p] + r * r * r);
@@ -164,16 +175,26 @@ float ItemValue(int32_t item, size_t p, int32_t n) {
             const float H = v > 0.0f ? 4.0f * std::sqrt(v) : 0.0f;
             return std::max(H, 1.0e-4f);
         }
-        case 2: return s.etaMax[p] - s.etaMin[p];
-        case 3: return s.etaMax[p];
-        case 4: return s.etaMin[p];
-        case 5: return s.sumEta[p] / N;
-        case 6: return s.sumP[p] / N;
-        case 7: return s.sumQ[p] / N;
-        case 8: return s.sumU[p] / N;
-        case 9: return s.sumV[p] / N;
-        case 10: return s.sumDelta[p] / N;
-        case 11: return skewness(s.sumEta[p], s.sumEta2[p], s.sumEta3[p]);
+        case 2:
+            return s.etaMax[p] - s.etaMin[p];
+        case 3:
+            return s.etaMax[p];
+        case 4:
+            return s.etaMin[p];
+        case 5:
+            return s.sumEta[p] / N;
+        case 6:
+            return s.sumP[p] / N;
+        case 7:
+            return s.sumQ[p] / N;
+        case 8:
+            return s.sumU[p] / N;
+        case 9:
+            return s.sumV[p] / N;
+        case 10:
+            return s.sumDelta[p] / N;
+        case 11:
+            return skewness(s.sumEta[p], s.sumEta2[p], s.sumEta3[p]);
         case 12: {
             const double m1 = s.sumEta[p] / static_cast<double>(N),
                          m2 = s.sumEta2[p] / static_cast<double>(N),
@@ -183,11 +204,14 @@ float ItemValue(int32_t item, size_t p, int32_t n) {
             return static_cast<float>(
                 (((6.0 * m2 - 3.0 * m1 * m1) * m1 - 4.0 * m3) * m1 + m4) / (var * var) - 3.0);
         }
-        case 13: return skewness(s.sumRate[p], s.sumRate2[p], s.sumRate3[p]);
+        case 13:
+            return skewness(s.sumRate[p], s.sumRate2[p], s.sumRate3[p]);
         case 15:
         case 16:
-        case 17: return kDeleteValue;  // no filtered series is kept
-        default: StopRun("WriteOutputStatistic: Wrong type of item");
+        case 17:
+            return kDeleteValue;  // no filtered series is kept
+        default:
+            StopRun("WriteOutputStatistic: Wrong type of item");
     }
 }
 
@@ -220,16 +244,16 @@ void InitOutputStatistic() {
         s.samples.assign(n, 0);
         s.firstStep.assign(n, set.type == 1 ? -1 : set.firstStep + 1);
         s.risen.assign(n, 0);
-        for (std::vector<float>* v : {&s.etaMax, &s.etaMin, &s.sumEta, &s.sumEta2, &s.sumEta3,
-                                      &s.sumEta4, &s.sumRate, &s.sumRate2, &s.sumRate3, &s.sumP,
-                                      &s.sumQ, &s.sumU, &s.sumV, &s.sumDelta})
+        for (std::vector<float>* v :
+             {&s.etaMax, &s.etaMin, &s.sumEta, &s.sumEta2, &s.sumEta3, &s.sumEta4, &s.sumRate,
+              &s.sumRate2, &s.sumRate3, &s.sumP, &s.sumQ, &s.sumU, &s.sumV, &s.sumDelta})
             v->assign(n, 0.0f);
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
     const DisturbanceSettings& d = gDisturbanceOutput;
-    s.waveScale = d.type > 0 && d.scalingType == 1 && d.incomingHeight > 0.0f ? d.incomingHeight
-                                                                               : 1.0f;
+    s.waveScale =
+        d.type > 0 && d.scalingType == 1 && d.incomingHeight > 0.0f ? d.incomingHeight : 1.0f;
 }
 
 void CreateOutputStatistic() {

@@ -96,7 +96,7 @@ struct BreakingFields {
     size_t stride;
     const float *bed, *xi, *xiPrev, *xiPrev2, *depth, *P, *PPrev, *Q, *QPrev;
     const int32_t *codeX, *codeY;
-    const uint8_t* blocked;          // kPorousOrSponge, kSource (PrepareBreaking)
+    const uint8_t* blocked;  // kPorousOrSponge, kSource (PrepareBreaking)
     float *tanPhi, *tanPhiOld, *delta, *deltaOld, *cx, *cxOld, *cy, *cyOld;
 };
 
@@ -310,7 +310,8 @@ void CelerityRow(const BreakingFields& f, int32_t axis, int32_t k, int32_t j1, i
         const double x1 = still ? cxo : vx * C / Ls, y1 = still ? cyo : vy * C / Ls;
         const bool off =
             (static_cast<double>(xi[j]) - bed[j] <= 0.0) | ((blocked[j] & kPorousOrSponge) != 0);
-        const float x = static_cast<float>(scaled ? x1 : vx), y = static_cast<float>(scaled ? y1 : vy);
+        const float x = static_cast<float>(scaled ? x1 : vx),
+                    y = static_cast<float>(scaled ? y1 : vy);
         cx[j] = off ? 0.0f : x;
         cy[j] = off ? 0.0f : y;
     }

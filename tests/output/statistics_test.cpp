@@ -185,12 +185,13 @@ TEST_F(StatisticsRun, OnlineSumsAgreeWithTheStoredSeriesOfTheSameRun) {
         "Type = 2\nType_of_mean_calculation = 1\nFirst_Time_step = 0\nLast_Time_step = 60\n"
         "Time_Step_Interval = 20\nNumber_of_First_Wave = 1\nNumber_Of_Records = 2\n" +
         RecordSection(1, "stat.xol0", gauges, rows, "1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14",
-             points) +
+                      points) +
         RecordSection(2, "stat.xol2", "0, 10, 1", "0, 8, 1", "1, 5, 15");
     const std::string det =
         "Number_Of_Records = 1\n" +
-        RecordSection(1, "series.xol0", gauges, rows, "1, 2, 3, 4",
-             points + "First_Time_step = 0\nLast_Time_step = 60\nTime_Step_Interval = 1\n");
+        RecordSection(
+            1, "series.xol0", gauges, rows, "1, 2, 3, 4",
+            points + "First_Time_step = 0\nLast_Time_step = 60\nTime_Step_Interval = 1\n");
     const bwtest::RunResult run =
         Run({{"Output_Statistic_2D", stat}, {"Output_Deterministic_2D", det}});
     ASSERT_EQ(run.exitCode, 0) << run.out;
@@ -353,15 +354,15 @@ TEST_F(StatisticsRun, WrongRecordsStopWithTheirMessages) {
     for (const auto& [file, items, message] :
          {std::tuple{"stat.dt3", "1", "SetupOutputDeterministic2D: Wrong file extension"},
           std::tuple{"stat.xol2", "1, 18", "WriteOutputStatistic: Wrong type of item"}}) {
-        const bwtest::RunResult r =
-            Run({{"Output_Statistic_2D", head + RecordSection(1, file, "0, 10, 1", "0, 8, 1", items)}});
+        const bwtest::RunResult r = Run(
+            {{"Output_Statistic_2D", head + RecordSection(1, file, "0, 10, 1", "0, 8, 1", items)}});
         EXPECT_EQ(r.exitCode, 1) << message;
         EXPECT_EQ(r.out, std::string(message) + "\n");
     }
     // A Type of 0 writes nothing, whatever records follow.
-    const bwtest::RunResult r =
-        Run({{"Output_Statistic_2D", "Type = 0\nNumber_Of_Records = 1\n" +
-                                         RecordSection(1, "none.xol2", "0, 10, 1", "0, 8, 1", "1")}});
+    const bwtest::RunResult r = Run(
+        {{"Output_Statistic_2D", "Type = 0\nNumber_Of_Records = 1\n" +
+                                     RecordSection(1, "none.xol2", "0, 10, 1", "0, 8, 1", "1")}});
     EXPECT_EQ(r.exitCode, 0) << r.out;
     EXPECT_FALSE(std::filesystem::exists(dir / "none.xol2"));
 }

@@ -2,18 +2,9 @@
 # Makes the data files of the flume example, runs it, and shows what it wrote.
 #   ./run.sh [folder of the built programs]   (default: build/release of the project)
 set -euo pipefail
-here=$(cd "$(dirname "$0")" && pwd)
-root=$(cd "$here/../.." && pwd)
-bin=${1:-$root/build/release}
-bw=$bin/src/bw
-bwdata=$bin/tools/bwdata/bwdata
-bwplot=$root/tools/bwplot/bwplot
-cd "$here"
+. "$(dirname "$0")/../common.sh"
 
-/usr/bin/python3 make_inputs.py
-"$bwdata" import-asc bathymetry.asc -o bathymetry.xol2 --title "Flume with a plane slope" >/dev/null
-"$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 1000 \
-    --title "Sponge layer before the wall" >/dev/null
+make_maps "Flume with a plane slope" "Sponge layer before the wall"
 "$bwdata" import-csv waves.csv -o waves.xol0 --start "2026-01-01 12:00:00" \
     --types 100078 --units 1000 --title "Incoming wave" >/dev/null
 

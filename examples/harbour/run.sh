@@ -3,18 +3,9 @@
 # wave disturbance and prints the area report of the last output.
 #   ./run.sh [folder of the built programs]   (default: build/release of the project)
 set -euo pipefail
-here=$(cd "$(dirname "$0")" && pwd)
-root=$(cd "$here/../.." && pwd)
-bin=${1:-$root/build/release}
-bw=$bin/src/bw
-bwdata=$bin/tools/bwdata/bwdata
-bwplot=$root/tools/bwplot/bwplot
-cd "$here"
+. "$(dirname "$0")/../common.sh"
 
-/usr/bin/python3 make_inputs.py
-"$bwdata" import-asc bathymetry.asc -o bathymetry.xol2 --title "Harbour behind a breakwater" >/dev/null
-"$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 1000 \
-    --title "Sponge layer behind the generation line" >/dev/null
+make_maps "Harbour behind a breakwater" "Sponge layer behind the generation line"
 "$bwdata" import-asc codes.asc -o codes.xol2 --name "Area code" --type 999 --unit 1000 \
     --title "Areas of the disturbance report" >/dev/null
 "$bwdata" import-csv waves.csv -o waves.xol0 --start "2026-01-01 12:00:00" \

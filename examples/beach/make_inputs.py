@@ -10,6 +10,11 @@ flat to 6 m, then rises at 1:20 to the still water line at 14 m and above
 it to 0.1 m at the east wall. A low mound on the slope, south of the middle,
 makes the waves break earlier there and bends the breaker line."""
 import math
+import os
+import sys
+
+sys.path.insert(0, os.path.join(os.path.dirname(os.path.abspath(__file__)), ".."))
+from inputs import write_grid, write_line_series  # noqa: E402
 
 DX = 0.05                # grid spacing, m
 LENGTH, WIDTH = 16.0, 6.0
@@ -26,18 +31,6 @@ RAMP = 3                 # periods of the cosine ramp at the start
 SPONGE = 3.0             # m of sponge at the west end
 SPONGE_END = 1.5         # its coefficient at the west wall
 LAND = 1.0
-GRAVITY = 9.81
-
-
-def wave_number(period, depth):
-    """k of the linear dispersion relation, by Newton's method."""
-    omega = 2.0 * math.pi / period
-    k = omega / math.sqrt(GRAVITY * depth)
-    for _ in range(50):
-        f = GRAVITY * k * math.tanh(k * depth) - omega * omega
-        df = GRAVITY * (math.tanh(k * depth) + k * depth / math.cosh(k * depth) ** 2)
-        k -= f / df
-    return k
 
 
 def bed(x, y):
@@ -47,39 +40,20 @@ def bed(x, y):
     return min(b + height * math.exp(-r2), TOP)
 
 
-def write_grid(path, values):
-    ny, nx = len(values), len(values[0])
-    with open(path, "w") as f:
-        f.write(f"ncols {nx}\nnrows {ny}\nxllcorner 0\nyllcorner 0\ncellsize {DX}\n"
-                "NODATA_value -9999\n")
-        for k in reversed(range(ny)):  # the first row of the file is the northernmost
-            f.write(" ".join(f"{v:.6f}" for v in values[k]) + "\n")
-
-
 def main():
     nx, ny = round(LENGTH / DX) + 1, round(WIDTH / DX) + 1
     wall = lambda j, k: j in (0, nx - 1) or k in (0, ny - 1)
     write_grid("bathymetry.asc",
-               [[LAND if wall(j, k) else bed(j * DX, k * DX) for j in range(nx)] for k in range(ny)])
+               [[LAND if wall(j, k) else bed(j * DX, k * DX) for j in range(nx)] for k in range(ny)], DX)
 
     def sponge(j):
         s = SPONGE - j * DX
         return 1.0 if s <= 0.0 else 1.0 + (SPONGE_END - 1.0) * (s / SPONGE) ** 2
-    write_grid("sponge.asc", [[sponge(j) for j in range(nx)] for k in range(ny)])
+    write_grid("sponge.asc", [[sponge(j) for j in range(nx)] for k in range(ny)], DX)
 
-    # The line feeds both of its rows with the series value, so each of the
-    # two waves it sends out carries that flux: a value of c H/2 makes a wave
-    # of height H, c the celerity.
-    k = wave_number(PERIOD, DEPTH)
-    c = 2.0 * math.pi / PERIOD / k
     dt = PERIOD / STEPS_A_PERIOD
-    omega = 2.0 * math.pi / PERIOD
-    with open("waves.csv", "w") as f:
-        f.write("time,Source\n")
-        for n in range(PERIODS * STEPS_A_PERIOD + 8):
-            t = n * dt
-            rise = 0.5 * (1.0 - math.cos(math.pi * t / (RAMP * PERIOD))) if t < RAMP * PERIOD else 1.0
-            f.write(f"{t:.10f},{rise * c * 0.5 * HEIGHT * math.sin(omega * t):.8f}\n")
+    k, c = write_line_series("waves.csv", PERIOD, HEIGHT, DEPTH, dt,
+                             PERIODS * STEPS_A_PERIOD + 7, RAMP)
     print(f"{nx} x {ny} points, dt = {dt:.10f} s, wavelength {2 * math.pi / k:.3f} m, "
           f"celerity {c:.3f} m/s")
 

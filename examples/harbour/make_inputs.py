@@ -17,6 +17,11 @@ Area codes (Type_of_Area_Statistic): 1 the sea in front of the breakwater,
 4 the inner basin west of the jetty; 0 in the sponges, on the slopes and
 around the line."""
 import math
+import os
+import sys
+
+sys.path.insert(0, os.path.join(os.path.dirname(os.path.abspath(__file__)), ".."))
+from inputs import write_grid, write_line_series  # noqa: E402
 
 DX = 0.1                 # grid spacing, m
 LENGTH_X, LENGTH_Y = 20.0, 14.0
@@ -34,28 +39,6 @@ BREAKWATER_Y = 7.0       # its south face; it is two cells thick
 MOUTH = (12.0, 14.4)     # x from .. to of the mouth
 JETTY_X, JETTY_Y = 6.0, 10.0  # the jetty runs from the quay south to JETTY_Y
 LAND = 1.0
-GRAVITY = 9.81
-
-
-def wave_number(period, depth):
-    """k of the linear dispersion relation of the model's equations without
-    the deep-water terms, w^2 = g h k^2 / (1 + (kh)^2 / 3), by Newton's method."""
-    omega2 = (2.0 * math.pi / period) ** 2
-    k = math.sqrt(omega2 / (GRAVITY * depth))
-    f = lambda k: GRAVITY * depth * k * k / (1.0 + (k * depth) ** 2 / 3.0) - omega2
-    for _ in range(50):
-        e = 1e-7 * k
-        k -= f(k) / ((f(k + e) - f(k - e)) / (2 * e))
-    return k
-
-
-def write_grid(path, values):
-    ny, nx = len(values), len(values[0])
-    with open(path, "w") as f:
-        f.write(f"ncols {nx}\nnrows {ny}\nxllcorner 0\nyllcorner 0\ncellsize {DX}\n"
-                "NODATA_value -9999\n")
-        for k in reversed(range(ny)):  # the first row of the file is the northernmost
-            f.write(" ".join(f"{v:g}" for v in values[k]) + "\n")
 
 
 def main():
@@ -84,8 +67,8 @@ def main():
         return 4 if (j < j_jetty and k >= k_jetty) else 3
 
     write_grid("bathymetry.asc",
-               [[LAND if land(j, k) else -DEPTH for j in range(nx)] for k in range(ny)])
-    write_grid("codes.asc", [[code(j, k) for j in range(nx)] for k in range(ny)])
+               [[LAND if land(j, k) else -DEPTH for j in range(nx)] for k in range(ny)], DX)
+    write_grid("codes.asc", [[code(j, k) for j in range(nx)] for k in range(ny)], DX)
 
     # Sponges rise with the square of the distance into them: at the south
     # end, and in the harbour along its sides, which stand for rubble slopes
@@ -96,20 +79,11 @@ def main():
         if k > kb + 1:
             s = max(s, SHORE - x, SHORE - (LENGTH_X - x), SHORE - (LENGTH_Y - y)) * SPONGE / SHORE
         return 1.0 if s <= 0.0 else 1.0 + (SPONGE_END - 1.0) * (s / SPONGE) ** 2
-    write_grid("sponge.asc", [[round(sponge(j, k), 6) for j in range(nx)] for k in range(ny)])
+    write_grid("sponge.asc", [[round(sponge(j, k), 6) for j in range(nx)] for k in range(ny)], DX)
 
-    # The line feeds both of its rows with the series value, so each of the
-    # two waves it sends out carries that flux: c H/2 makes a wave of height H.
-    k = wave_number(PERIOD, DEPTH)
-    omega = 2.0 * math.pi / PERIOD
-    c = omega / k
     dt = PERIOD / STEPS_A_PERIOD
-    with open("waves.csv", "w") as f:
-        f.write("time,Source\n")
-        for n in range(PERIODS * STEPS_A_PERIOD + 8):
-            t = n * dt
-            rise = 0.5 * (1.0 - math.cos(math.pi * t / (RAMP * PERIOD))) if t < RAMP * PERIOD else 1.0
-            f.write(f"{t:.10f},{rise * c * 0.5 * HEIGHT * math.sin(omega * t):.8f}\n")
+    k, c = write_line_series("waves.csv", PERIOD, HEIGHT, DEPTH, dt,
+                             PERIODS * STEPS_A_PERIOD + 7, RAMP)
     print(f"{nx} x {ny} points, dt = {dt:g} s, wavelength {2 * math.pi / k:.3f} m, "
           f"celerity {c:.3f} m/s, Hm0 of the incoming wave {math.sqrt(2.0) * HEIGHT:.4f} m")
 

@@ -37,10 +37,12 @@ void WriteIntegerRecord(const char* tag, long long value) {
     WriteRecord(tag, text);
 }
 
-// Blanks the name from the last occurrence of part to its end.
+// Blanks the name from the last occurrence of part to its end, where that
+// stands in the file's own name and not in a folder of its path.
 void CutAtLast(std::string& name, const char* part) {
     const size_t pos = name.rfind(part);
-    if (pos != std::string::npos) name.erase(pos);
+    const size_t slash = name.find_last_of('/');
+    if (pos != std::string::npos && (slash == std::string::npos || pos > slash)) name.erase(pos);
 }
 
 }  // namespace

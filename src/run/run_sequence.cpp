@@ -56,13 +56,13 @@ std::string ParseArguments(int argc, const char* const* argv, int& debugLevel) {
 }
 
 std::string ChannelName(std::string_view fileName) {
-    const std::string name(Trim(fileName));
-    const size_t lower = name.rfind(".bw");
-    const size_t upper = name.rfind(".BW");
-    size_t cut = std::string::npos;
-    if (lower != std::string::npos) cut = lower;
-    if (upper != std::string::npos && (cut == std::string::npos || upper > cut)) cut = upper;
-    return cut == std::string::npos ? name : name.substr(0, cut);
+    // The extension is what follows the last "." of the file's own name, as
+    // for the log: a "." in a folder's name is part of the stem.
+    std::string name(Trim(fileName));
+    const size_t slash = name.find_last_of('/');
+    const size_t dot = name.rfind('.');
+    if (dot != std::string::npos && (slash == std::string::npos || dot > slash)) name.erase(dot);
+    return name;
 }
 
 void ReadCommandLine(int argc, const char* const* argv) {

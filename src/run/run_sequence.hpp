@@ -13,7 +13,7 @@ constexpr const char* kProgramTitle = "TARNEL BW";
 // Walks the arguments (argv[1..]) and gives the parameter file name, empty
 // when none is left; an option blanks the name read before it.
 std::string ParseArguments(int argc, const char* const* argv, int& debugLevel);
-// The stem of the progress channel: the name without its ".bw" or ".BW".
+// The stem of the progress channel: the path less its file's extension, as the log's.
 std::string ChannelName(std::string_view fileName);
 
 // The command line, the channel, the parameter file and the log.

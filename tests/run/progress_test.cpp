@@ -69,6 +69,12 @@ TEST_F(ProgressChannel, NamesAndModes) {
     OpenProgressChannel(dir / "run.inp.log.x");
     EXPECT_TRUE(fs::exists(dir / "run._spi_"));
     ReleaseUnit(gProgress.progressUnit);
+    // Only in the file's own name: a folder's ".log" stays.
+    fs::create_directory(dir / "a.log");
+    OpenProgressChannel((dir / "a.log") + "/b");
+    EXPECT_TRUE(fs::exists((dir / "a.log") + "/b._spi_"));
+    ReleaseUnit(gProgress.progressUnit);
+    fs::remove_all(dir / "a.log");
 
     gProgress = ProgressState{};
     testing::internal::CaptureStdout();

@@ -20,6 +20,11 @@ TEST(CommandLine, OptionsAndTheFileName) {
     EXPECT_EQ(level, 2);
     EXPECT_EQ(ChannelName("HARBOUR.BW"), "HARBOUR");
     EXPECT_EQ(ChannelName("  a.BW.copy.bw  "), "a.BW.copy");
+    // The stem is the path less the file's extension, as the log's: a "."
+    // in a folder's name stays, and a name without extension is whole.
+    EXPECT_EQ(ChannelName("x.bwtests/model.bw"), "x.bwtests/model");
+    EXPECT_EQ(ChannelName("x.bwtests/model"), "x.bwtests/model");
+    EXPECT_EQ(ChannelName("runs/harbour.kvt"), "runs/harbour");
 }
 
 // Threads: 0 or -1 ask for all, cut to the runtime's maximum, at least one.

@@ -125,9 +125,10 @@ void BlowUp(const std::string& text, int32_t i, int32_t j) {
         FillPercent(message, message, j);
         WriteLine("---------- B L O W  -  U P  detected ---");
         WriteLine(message);
+        WriteLine(Filled("in time step %", gLoop.currentStep));
         WriteLine("");
         WriteLine("COMPUTATION ENDED");
-        CloseOutputDeterministic();
+        CloseOutputs();
         Shutdown(gRun.parameterFileName, kExitAbnormal);
     }
     std::abort();  // not reached: the shutdown ends the process

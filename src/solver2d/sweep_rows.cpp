@@ -146,10 +146,14 @@ void CheckChainDepth(const AxisView& v, int32_t k, int32_t first, int32_t last) 
     const float* depth = v.depth;
     for (int32_t j = first; j <= last; ++j) {
         const float d = depth[v.At(j, k)];
-        // A not-a-number passes: the comparisons are false for it.
-        if (d < 0.0001f || d > 1e10f) {
-            if (v.axis == 1) BlowUp("Negative water depth, near (%,%)", j, k);
-            BlowUp("Negative water depth, near (%,%)", k, j);
+        // Written so that a not-a-number fails too: once one is in the state
+        // it spreads over the grid, and the run must end here as a blow-up
+        // rather than fill its outputs with it.
+        if (!(d >= 0.0001f && d <= 1e10f)) {
+            const char* text = d != d ? "Water depth is not a number, near (%,%)"
+                                      : "Negative water depth, near (%,%)";
+            if (v.axis == 1) BlowUp(text, j, k);
+            BlowUp(text, k, j);
         }
     }
 }

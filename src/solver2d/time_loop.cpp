@@ -2,6 +2,10 @@
 
 #include <omp.h>
 
+#include <cmath>
+#include <string>
+#include <vector>
+
 #include "output/deterministic.hpp"
 #include "output/disturbance.hpp"
 #include "output/hotstart.hpp"
@@ -203,6 +207,7 @@ void PrepareTimeLoop() {
 }
 
 void ComputeStep(int32_t n) {
+    gLoop.currentStep = n;
     TsReadStep(n);
     UpdateBoundaryData(n);
     if (gEddy.eddyType == 2) CalcEddyViscosity();
@@ -211,6 +216,28 @@ void ComputeStep(int32_t n) {
     if (gEquation.gridScaleFilter > 0.0f) {
         CalcGridScaleFilter();
         CalculateDepth(gGrid.J, gGrid.K, gGrid.depth.data(), gGrid.bed.data(), gGrid.xi.data());
+    }
+}
+
+void CloseOutputs() {
+    CloseOutputDeterministic();
+    if (gStatisticOutput.type > 0) CloseOutputStatistic();
+    if (gDisturbanceOutput.type > 0) CloseOutputDisturbance();
+}
+
+void CheckStateFinite() {
+    const GridState& g = gGrid;
+    const size_t stride = static_cast<size_t>(g.J) + 1;
+    // The sweeps stop at a depth that is not a number; a flux can still hold
+    // one after the last step, before any sweep has met it.
+    for (const std::vector<float>* field : {&g.xi, &g.P, &g.Q}) {
+        const float* v = field->data();
+        for (size_t p = 0; p < field->size(); ++p) {
+            if (std::isfinite(v[p])) continue;
+            const auto j = static_cast<int32_t>(p % stride), k = static_cast<int32_t>(p / stride);
+            const char* name = field == &g.xi ? "Surface" : field == &g.P ? "P flux" : "Q flux";
+            BlowUp(std::string(name) + " is not a finite number, near (%,%)", j, k);
+        }
     }
 }
 
@@ -247,7 +274,6 @@ void Compute(int& exitCode) {
     gLoop.stepsDone = 0;
     StartLoopTasks();
     for (int32_t n = 1; n <= g.timeStepCount; ++n) {
-        gLoop.currentStep = n;
         gLoop.pointSteps += gChains.activePoints;
         gLoop.stepsDone += 1;
         if (n % 100 == 0) WriteLine(Filled("Time step: %", n));
@@ -275,10 +301,9 @@ void Compute(int& exitCode) {
     StopLoopTasks();
 
     StartTiming(gOverallTiming, kTaskPostProcessing);
+    CheckStateFinite();
     WriteLine("");
-    CloseOutputDeterministic();
-    if (statistics) CloseOutputStatistic();
-    if (disturbance) CloseOutputDisturbance();
+    CloseOutputs();
     WriteTimingReport(gLoop.timing);
     WriteRunStatistics(gOverallTiming, gLoop.stepsDone, gChains.activePoints,
                        static_cast<int64_t>(gLoop.pointSteps));

@@ -32,6 +32,10 @@ void Compute(int& exitCode);
 // Before the first step: the chains, the count of active points and the
 // sweep buffers (the first acts of Compute, for tests that drive the loop).
 void PrepareTimeLoop();
+// Closes the outputs that are on: deterministic, statistics, disturbance.
+void CloseOutputs();
+// A blow-up at the first surface level or flux that is not a finite number.
+void CheckStateFinite();
 // The computing of time step n: the row of the series, the boundary data,
 // the x half and the y half. The caller writes output and turns the line order.
 void ComputeStep(int32_t n);

@@ -13,6 +13,8 @@
 #include <numbers>
 #include <random>
 
+#include <unistd.h>
+
 #include "processes/porosity.hpp"
 #include "solver2d/chains.hpp"
 #include "solver2d/model_state.hpp"
@@ -193,3 +195,35 @@ TEST(SurfaceEstimate, CoversThePointsOfTheChainsAndNoOther) {
 }
 
 }  // namespace
+
+// A value that is not a number ends the run as a blow-up at its point, for
+// both sweep families; a flux that holds one after the last step is found
+// before the outputs are closed. The messages go to standard output while no
+// log is open: the dying child sends them to standard error for the check.
+TEST(BlowUp, ANotANumberInTheStateStopsTheRunAtItsPoint) {
+    for (const int32_t handle : {0, 1}) {
+        bwtest::BasinSpec spec;
+        spec.convectiveHandle = handle;
+        bwtest::MakeBasin(spec);
+        bwtest::SetSurface([](float, float) { return 0.0f; });
+        // As a solve leaves it: the depths of the next sweep hold it, and
+        // the first point that sweep meets is named.
+        gGrid.xi[2 * (gGrid.J + 1) + 5] = std::nanf("");
+        EXPECT_EXIT(
+            {
+                dup2(2, 1);
+                bwtest::RunSteps(3);
+            },
+            testing::ExitedWithCode(255),
+            "Water depth is not a number, near \\([0-9]+,[1-3]\\)\nin time step 1\n")
+            << handle;
+    }
+    bwtest::MakeBasin({});
+    gGrid.Q[3 * (gGrid.J + 1) + 7] = INFINITY;
+    EXPECT_EXIT(
+        {
+            dup2(2, 1);
+            CheckStateFinite();
+        },
+        testing::ExitedWithCode(255), "Q flux is not a finite number, near \\(7,3\\)");
+}

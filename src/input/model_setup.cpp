@@ -1,6 +1,8 @@
 #include "input/model_setup.hpp"
 
 #include <algorithm>
+#include <cmath>
+#include <cstdio>
 
 #include "data/tsfunc.hpp"
 #include "input/kvt_access.hpp"
@@ -15,6 +17,7 @@
 #include "processes/shoreline.hpp"
 #include "processes/sponge.hpp"
 #include "run/datetime.hpp"
+#include "run/memory.hpp"
 #include "run/messages.hpp"
 #include "run/progress.hpp"
 #include "solver2d/model_state.hpp"
@@ -66,7 +69,38 @@ void ReadSimulationPeriod(KvtHandle target) {
     KvtGetInteger(section, "Time_step_count", count);
     KvtGetDouble(section, "Time_step_interval", dt);
     KvtGetInteger(section, "Warm_up_period", warmUp);
+    const bool startGiven = kvtKeywordByNameNum(section, "Start_time", 1) != 0;
     KvtGetIntegerList(section, "Start_time", start, 6);
+    // Checks the reader adds to the plain reading: a run of no steps, a step
+    // that is not a positive number, a start that no calendar has, and a
+    // warm-up of negative length cannot be meant, and would otherwise run to
+    // a normal end with empty or meaningless output.
+    const std::string steps = "Time_step_count = " + std::to_string(count);
+    if (count < 1 || count == INT32_MAX)
+        StopRun("ReadModelSetup: " + steps +
+                " in section Simulation_Period; the number of time steps must be from 1 to "
+                "2147483646");
+    // A boundary series is held in memory as a table of four values a step
+    // while it is resampled to the steps of the run.
+    CheckMemory(steps, count + 1.0, 4.0 * sizeof(float));
+    if (!(dt > 0.0) || !std::isfinite(dt))
+        StopRun(
+            Filled("ReadModelSetup: Time_step_interval = % in section Simulation_Period; the "
+                   "time step must be a number of seconds above 0",
+                   dt));
+    if (warmUp < 0)
+        StopRun(
+            Filled("ReadModelSetup: Warm_up_period = % in section Simulation_Period; the "
+                   "warm-up must be 0 or more time steps",
+                   warmUp));
+    if (startGiven && !DateExists(start[0], start[1], start[2], start[3], start[4], start[5])) {
+        char text[96];
+        std::snprintf(text, sizeof text, "%d,%d,%d,%d,%d,%d", start[0], start[1], start[2],
+                      start[3], start[4], start[5]);
+        StopRun("ReadModelSetup: Start_time = " + std::string(text) +
+                " in section Simulation_Period is not a date; year (0 to 9999), month, day, "
+                "hour, minute and second of an existing date are expected");
+    }
     g.timeStepCount = count;
     g.lastStep = count - 1;
     g.dt = dt;

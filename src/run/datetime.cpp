@@ -52,18 +52,22 @@ std::string DateTimeText(DateTime date) {
     return text;
 }
 
+bool DateExists(int year, int month, int day, int hour, int minute, int second) {
+    if (year < 0 || year > 9999 || month < 1 || month > 12 || day < 1 || hour < 0 || hour > 23 ||
+        minute < 0 || minute > 59 || second < 0 || second > 59)
+        return false;
+    int y, m, d;
+    CalendarDate(DayNumber(year, month, day), y, m, d);
+    return y == year && m == month && d == day;  // not 2023-02-30 and the like
+}
+
 bool ParseDateTime(const std::string& text, DateTime& date) {
     int year, month, day, hour = 0, minute = 0, second = 0;
     char tail = 0;
     int fields = std::sscanf(text.c_str(), "%4d-%2d-%2d %2d:%2d:%2d%c", &year, &month, &day, &hour,
                              &minute, &second, &tail);
     if (fields != 6 && fields != 3) return false;
-    if (month < 1 || month > 12 || day < 1 || hour < 0 || hour > 23 || minute < 0 || minute > 59 ||
-        second < 0 || second > 59)
-        return false;
-    int y, m, d;
-    CalendarDate(DayNumber(year, month, day), y, m, d);
-    if (y != year || m != month || d != day) return false;  // 2023-02-30 and the like
+    if (!DateExists(year, month, day, hour, minute, second)) return false;
     date = MakeDateTime(year, month, day, hour, minute, second);
     return true;
 }

@@ -18,5 +18,8 @@ DateTime MakeDateTime(int year, int month, int day, int hour, int minute, double
 DateTime AddSeconds(DateTime date, double seconds);
 // "YYYY-MM-DD hh:mm:ss", seconds cut to whole ones.
 std::string DateTimeText(DateTime date);
+// True for a date of the years 0 to 9999 that the calendar has, at a time
+// of the day from 00:00:00 to 23:59:59.
+bool DateExists(int year, int month, int day, int hour, int minute, int second);
 // Reads "YYYY-MM-DD hh:mm:ss" (or "YYYY-MM-DD"); false on any other form or an impossible date.
 bool ParseDateTime(const std::string& text, DateTime& date);

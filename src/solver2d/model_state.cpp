@@ -9,6 +9,7 @@
 #include "processes/rollers.hpp"
 #include "processes/shoreline.hpp"
 #include "processes/sponge.hpp"
+#include "run/memory.hpp"
 #include "run/messages.hpp"
 #include "solver2d/grid_filter.hpp"
 
@@ -28,6 +29,11 @@ void Fill(Field& field, size_t points, float value) {
 void AllocateModelState() {
     GridState& g = gGrid;
     const size_t n = g.Points();
+    // Sixteen fields of 32-bit reals and the two code tables, weighed before
+    // any is taken.
+    const double bytes = 16.0 * sizeof(float) + 2.0 * sizeof(gChains.codeX[0]);
+    CheckMemory(Filled(Filled("the state of a grid of % x % points", g.J + 1), g.K + 1),
+                static_cast<double>(n), bytes);
     try {
         for (Field* f : {&g.xi, &g.P, &g.Q, &g.xiPrev, &g.PPrev, &g.QPrev, &g.xiPrev2})
             Fill(*f, n, 1e-10f);

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <tuple>
+
 namespace {
 
 // Day numbers keep the Gregorian leap rules and turn back into the same
@@ -24,6 +26,18 @@ TEST(Dates, DayNumbersRollOverAndParsing) {
     EXPECT_EQ(DateTimeText(p), "2024-02-29 12:00:01");
     for (const char* bad : {"2023-02-29 00:00:00", "2023-01-01 24:00:00", "yesterday"})
         EXPECT_FALSE(ParseDateTime(bad, p)) << bad;
+    // Each part at its bounds: the first that falls outside is refused.
+    EXPECT_TRUE(DateExists(2000, 2, 29, 23, 59, 59));
+    EXPECT_TRUE(DateExists(0, 1, 1, 0, 0, 0));
+    for (const auto& [y, mo, d, h, mi, s] : {std::tuple{1900, 2, 29, 0, 0, 0},
+                                             {2004, 13, 1, 0, 0, 0},
+                                             {2004, 4, 31, 0, 0, 0},
+                                             {2004, 1, 0, 0, 0, 0},
+                                             {2004, 1, 1, 0, 60, 0},
+                                             {2004, 1, 1, 0, 0, -1},
+                                             {10000, 1, 1, 0, 0, 0}})
+        EXPECT_FALSE(DateExists(y, mo, d, h, mi, s))
+            << y << "-" << mo << "-" << d << " " << h << ":" << mi;
 }
 
 }  // namespace

@@ -3,7 +3,9 @@
 // calls and checked for consistency: each node is found again by its name and
 // instance, levels and paths follow the nesting, each parameter has one kind
 // and the value calls agree with it. An input that loads cleanly must write
-// and load back to the same tree.
+// and load back to the same tree. The report of what a run left unread gives
+// one text per target before any look-up, and none once the walk has looked
+// up every node by its name and instance.
 #include <unistd.h>
 
 #include <cstdint>
@@ -111,6 +113,25 @@ KvtHandle Walk(KvtHandle file) {
     return first;
 }
 
+// The texts of the unread report, each checked for its form.
+int UnreadTexts(KvtHandle file) {
+    int count = 0;
+    const int reported = kvtReportUnread(
+        file,
+        [](const char* text, void* data) {
+            ++*static_cast<int*>(data);
+            Check(std::strncmp(text, "Target ", 7) == 0 || std::strncmp(text, "Section ", 8) == 0 ||
+                      std::strncmp(text, "Key ", 4) == 0,
+                  "an unread text without its kind");
+            Check(std::strstr(text, " is not read by this run") != nullptr ||
+                      std::strstr(text, " is given twice, on lines ") != nullptr,
+                  "an unread text without its finding");
+        },
+        &count);
+    Check(reported == count && kvtPeekErrorGlb() == kKvtOk, "unread count");
+    return count;
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
@@ -130,7 +151,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         Check(line == 0 && column == 0 && text != nullptr && text[0] == '\0', "clean load");
     }
 
+    int targets = 0;
+    while (kvtChildByNum(file, targets + 1) != 0) ++targets;
+    Check(UnreadTexts(file) == targets, "unread before any look-up");
     const KvtHandle first = Walk(file);
+    Check(UnreadTexts(file) == 0, "unread after a walk by names");
 
     // A tree read before an error writes too; it must load back the same.
     static const std::string path = "/tmp/kvt_fuzz_" + std::to_string(getpid()) + ".kvt";

@@ -41,6 +41,11 @@ constexpr int kKvtErrBuild = 1008;     // a building call out of order
 // handle (of what was read before it) with the error code 1003 pending.
 // Returns 0 when the file can't be read.
 KvtHandle kvtLoadFile(const char* path, int option, KvtHandle* file);
+// Why the last kvtLoadFile gave 0: the system's text ("Permission denied",
+// "Is a directory", ...), "not a regular file" for a device or a pipe, and ""
+// when the file does not exist (no such name, or a folder on the way is a
+// file) or the load succeeded.
+const char* kvtGetFileErrorText();
 // Parses a text as if it were the file at path (path sets the folder that
 // relative file names are resolved against; null: the working folder).
 KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHandle* file);
@@ -53,6 +58,25 @@ KvtHandle kvtTargetByNameNum(KvtHandle file, const char* name, int instance);
 KvtHandle kvtSectionByNameNum(KvtHandle parent, const char* name, int instance);
 KvtHandle kvtKeywordByNameNum(KvtHandle section, const char* name, int instance);
 KvtHandle kvtParamByNum(KvtHandle keyword, int number);
+// The number of parameters of a keyword.
+int kvtParamCount(KvtHandle keyword);
+// As kvtKeywordByNameNum, but it neither marks the keyword nor records the
+// name: for checks that are not reads of a setting.
+KvtHandle kvtKeywordPeek(KvtHandle section, const char* name, int instance);
+
+// Read marks. The three look-ups by name mark the node they find as read and
+// record the name asked for in the node searched, found or not; walking by
+// number marks nothing. What a run left unread is then known: see
+// kvtReportUnread.
+bool kvtIsRead(KvtHandle node);
+// The number-th name (from 1) asked for in a file (names of targets), a
+// target or a section, each once, in the order first asked; keyword tells a
+// keyword's name from a section's. Null and kKvtErrNotFound past the last.
+// The text stays valid until kvtClose.
+const char* kvtGetAskedName(KvtHandle node, int number, bool* keyword);
+// The line (from 1) where the name of a target, section or keyword stands in
+// the loaded file; 0 in a tree built in memory.
+int kvtGetLine(KvtHandle node);
 
 // Walking a tree in file order without knowing its names: the number-th child
 // (from 1) of a file (its targets), of a target or section (its sections and
@@ -89,6 +113,20 @@ const char* kvtGetFilename(KvtHandle param);
 // tree built in memory); absolute ones stay. A longer path gives null and
 // kKvtErrRange.
 const char* kvtGetResultFilenamePath(KvtHandle param);
+// The parameter in the file's syntax, for messages: integers in full, reals
+// in the shortest form that reads back the same, texts quoted and escaped,
+// file names as file("name").
+const char* kvtGetParamText(KvtHandle param);
+
+// What a run left unread, once it has read its settings, in file order: a
+// target, section or keyword never found by a look-up by name ("is not read
+// by this run", with the nearest name of its kind asked for in the same
+// parent when one is close; nothing inside an unread section), and a second
+// instance of a name of which another instance was read ("is given twice").
+// Calls report with each text (without a closing period) and returns their
+// number.
+using KvtReportFn = void (*)(const char* text, void* data);
+int kvtReportUnread(KvtHandle file, KvtReportFn report, void* data);
 
 // Ends a tree, loaded or built, and sets the handle to 0. Only the file handle
 // ends a tree; any other handle is refused with kKvtErrHandle.

@@ -10,6 +10,7 @@
 #include <memory>
 #include <string>
 #include <unordered_map>
+#include <unordered_set>
 #include <vector>
 
 #include "platform/kvt/kvt.hpp"
@@ -22,6 +23,14 @@ enum class KvtValueKind : uint8_t { Integer, Real, Logical, Text, Filename };
 // with many children and kept up to date as children are added.
 using KvtNameIndex = std::unordered_map<std::string, std::vector<int>>;
 
+// The names looked up in a file, target or section, each once, in the order
+// first asked: the kind's digit and the name, as the keys of the name index.
+// A deque, so that the names handed out stay where they are.
+struct KvtAsked {
+    std::deque<std::string> names;
+    std::unordered_set<std::string> known;
+};
+
 struct KvtNode {
     KvtNodeKind kind = KvtNodeKind::File;
     int parent = -1;
@@ -29,6 +38,9 @@ struct KvtNode {
     std::string name;           // targets, sections and keywords
     std::vector<int> children;  // in file order
     std::unique_ptr<KvtNameIndex> index;
+    int line = 0;       // of the name in the loaded file, from 1; 0 when built in memory
+    bool read = false;  // found by a look-up by name
+    std::unique_ptr<KvtAsked> asked;
     // Parameters.
     KvtValueKind valueKind = KvtValueKind::Integer;
     bool single = false;  // a real added as 32-bit: written with 9 digits
@@ -36,7 +48,8 @@ struct KvtNode {
     double real = 0.0;
     bool logical = false;
     std::string text;  // texts and file names as written
-    // Made on the first call that asks for them, then never changed.
+    // Made on the first call that asks for them, then never changed. A
+    // parameter keeps its text as written in globalName.
     std::string globalName;
     std::string resolved;
 };
@@ -71,6 +84,12 @@ int KvtAddNode(KvtTree& tree, int parent, KvtNodeKind kind, const std::string& n
 // Removes the node added last (a keyword left without parameters by a syntax error).
 void KvtDropLastNode(KvtTree& tree);
 bool KvtValidName(const char* name);
+// The key of a child in its parent's name index and list of asked names.
+std::string KvtIndexKey(KvtNodeKind kind, const std::string& name);
+// The children of parent of that kind and name, in file order (the parent's
+// name index is made if it has none yet).
+const std::vector<int>& KvtInstances(KvtTree& tree, int parent, KvtNodeKind kind,
+                                     const std::string& name);
 // Parses text into an empty tree. On a syntax error fills the error fields and
 // returns false, keeping what was read before it.
 bool KvtParse(KvtTree& tree, const char* text, size_t length);

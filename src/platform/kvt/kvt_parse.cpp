@@ -11,17 +11,57 @@
 //   statement = name '{' { statement } '}' | name '=' value { ',' value }
 //   value     = integer | real | logical | "text" | file("text")
 // A '{' may stand on the line of its name or on a later one.
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
 #include <charconv>
 #include <cstring>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <string>
 #include <vector>
 
 #include "platform/kvt/kvt_internal.hpp"
 
 namespace {
+
+// Why the last kvtLoadFile failed; "" when the file does not exist.
+std::string gFileError;
+
+// Reads a regular file whole, or keeps the reason it can't in gFileError.
+// Opened without waiting, so that a pipe or a device named by mistake does
+// not block the load.
+bool ReadWholeFile(const char* path, std::string& text) {
+    const int fd = open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (fd < 0) {
+        if (errno != ENOENT && errno != ENOTDIR) gFileError = std::strerror(errno);
+        return false;
+    }
+    struct stat info {};
+    if (fstat(fd, &info) != 0) {
+        gFileError = std::strerror(errno);
+    } else if (S_ISDIR(info.st_mode)) {
+        gFileError = std::strerror(EISDIR);
+    } else if (!S_ISREG(info.st_mode)) {
+        gFileError = "not a regular file";
+    } else {
+        text.reserve(static_cast<size_t>(info.st_size));
+        char buffer[1 << 16];
+        for (;;) {
+            const ssize_t n = read(fd, buffer, sizeof buffer);
+            if (n > 0) {
+                text.append(buffer, static_cast<size_t>(n));
+            } else if (n == 0) {
+                break;
+            } else if (errno != EINTR) {
+                gFileError = std::strerror(errno);
+                break;
+            }
+        }
+    }
+    close(fd);
+    return gFileError.empty();
+}
 
 struct Place {
     int line = 1;
@@ -264,6 +304,7 @@ struct Parser {
                 if (open.empty()) return Fail(at, "a keyword must stand inside a target");
                 cur.Advance();
                 const int keyword = KvtAddNode(tree, parent, KvtNodeKind::Keyword, name);
+                tree.nodes[keyword].line = at.line;
                 if (ReadValues(keyword)) continue;
                 // What was read of the line stays, but not a keyword without values.
                 if (tree.nodes[keyword].children.empty()) KvtDropLastNode(tree);
@@ -286,6 +327,7 @@ struct Parser {
             cur.Advance();
             const KvtNodeKind kind = open.empty() ? KvtNodeKind::Target : KvtNodeKind::Section;
             open.push_back({KvtAddNode(tree, parent, kind, name), at});
+            tree.nodes[open.back().node].line = at.line;
         }
     }
 };
@@ -313,16 +355,15 @@ KvtHandle kvtLoadText(const char* text, uint64_t length, const char* path, KvtHa
     return handle;
 }
 
+const char* kvtGetFileErrorText() {
+    return gFileError.c_str();
+}
+
 KvtHandle kvtLoadFile(const char* path, int /*option*/, KvtHandle* file) {
     if (file != nullptr) *file = 0;
-    std::error_code ec;
-    if (path == nullptr || !std::filesystem::is_regular_file(path, ec)) {
-        KvtSetError(kKvtErrFile);
-        return 0;
-    }
-    std::ifstream in(path, std::ios::binary);
-    std::string text((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-    if (in.bad()) {
+    gFileError.clear();
+    std::string text;
+    if (path == nullptr || !ReadWholeFile(path, text)) {
         KvtSetError(kKvtErrFile);
         return 0;
     }

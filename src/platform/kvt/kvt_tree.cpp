@@ -54,45 +54,62 @@ KvtNode* Param(KvtHandle handle) {
     return Node(handle, {KvtNodeKind::Param});
 }
 
-std::string IndexKey(KvtNodeKind kind, const std::string& name) {
-    return static_cast<char>('0' + static_cast<int>(kind)) + name;
-}
-
 void AddToIndex(KvtNameIndex& index, const KvtNode& child, int childIndex) {
-    index[IndexKey(child.kind, child.name)].push_back(childIndex);
+    index[KvtIndexKey(child.kind, child.name)].push_back(childIndex);
 }
 
+void MakeIndex(KvtTree& tree, KvtNode& node) {
+    node.index = std::make_unique<KvtNameIndex>();
+    for (int child : node.children) AddToIndex(*node.index, tree.nodes[child], child);
+}
+
+// Keeps the name asked for in a node, once, for the report of what a run left unread.
+void RecordAsked(KvtNode& node, KvtNodeKind kind, const char* name) {
+    if (name[0] == '\0') return;
+    if (node.asked == nullptr) node.asked = std::make_unique<KvtAsked>();
+    std::string key = KvtIndexKey(kind, name);
+    if (node.asked->known.insert(key).second) node.asked->names.push_back(std::move(key));
+}
+
+// A child by kind, name and instance. A look-up that reads (mark) records the
+// name asked in the parent and marks the child it finds.
 KvtHandle ChildByNameNum(KvtHandle parent, std::initializer_list<KvtNodeKind> parentKinds,
-                         KvtNodeKind childKind, const char* name, int instance) {
+                         KvtNodeKind childKind, const char* name, int instance, bool mark = true) {
     KvtTree* tree = nullptr;
     KvtNode* node = Node(parent, parentKinds, &tree);
     if (node == nullptr) return 0;
-    if (name == nullptr || instance < 1) {
+    if (name == nullptr) {
         KvtSetError(kKvtErrNotFound);
         return 0;
     }
-    if (node->index == nullptr && node->children.size() >= kIndexFrom) {
-        node->index = std::make_unique<KvtNameIndex>();
-        for (int child : node->children) AddToIndex(*node->index, tree->nodes[child], child);
+    if (mark) RecordAsked(*node, childKind, name);
+    if (instance < 1) {
+        KvtSetError(kKvtErrNotFound);
+        return 0;
     }
+    if (node->index == nullptr && node->children.size() >= kIndexFrom) MakeIndex(*tree, *node);
+    int found = -1;
     if (node->index != nullptr) {
-        const auto it = node->index->find(IndexKey(childKind, name));
-        if (it != node->index->end() && instance <= static_cast<int>(it->second.size())) {
-            KvtSetError(kKvtOk);
-            return KvtMakeHandle(*tree, it->second[instance - 1]);
-        }
+        const auto it = node->index->find(KvtIndexKey(childKind, name));
+        if (it != node->index->end() && instance <= static_cast<int>(it->second.size()))
+            found = it->second[instance - 1];
     } else {
         int seen = 0;
         for (int child : node->children) {
             const KvtNode& c = tree->nodes[child];
             if (c.kind == childKind && c.name == name && ++seen == instance) {
-                KvtSetError(kKvtOk);
-                return KvtMakeHandle(*tree, child);
+                found = child;
+                break;
             }
         }
     }
-    KvtSetError(kKvtErrNotFound);
-    return 0;
+    if (found < 0) {
+        KvtSetError(kKvtErrNotFound);
+        return 0;
+    }
+    if (mark) tree->nodes[found].read = true;
+    KvtSetError(kKvtOk);
+    return KvtMakeHandle(*tree, found);
 }
 
 bool IsKind(KvtHandle param, KvtValueKind kind) {
@@ -159,13 +176,26 @@ void KvtDropLastNode(KvtTree& tree) {
     const int index = static_cast<int>(tree.nodes.size()) - 1;
     KvtNode& p = tree.nodes[tree.nodes.back().parent];
     if (p.index != nullptr) {
-        const auto it = p.index->find(IndexKey(tree.nodes.back().kind, tree.nodes.back().name));
+        const auto it = p.index->find(KvtIndexKey(tree.nodes.back().kind, tree.nodes.back().name));
         it->second.pop_back();
         if (it->second.empty()) p.index->erase(it);
     }
     p.children.pop_back();
     if (tree.lastKeyword == index) tree.lastKeyword = -1;
     tree.nodes.pop_back();
+}
+
+std::string KvtIndexKey(KvtNodeKind kind, const std::string& name) {
+    return static_cast<char>('0' + static_cast<int>(kind)) + name;
+}
+
+const std::vector<int>& KvtInstances(KvtTree& tree, int parent, KvtNodeKind kind,
+                                     const std::string& name) {
+    static const std::vector<int> kNone;
+    KvtNode& node = tree.nodes[parent];
+    if (node.index == nullptr) MakeIndex(tree, node);
+    const auto it = node.index->find(KvtIndexKey(kind, name));
+    return it != node.index->end() ? it->second : kNone;
 }
 
 bool KvtValidName(const char* name) {
@@ -206,6 +236,11 @@ KvtHandle kvtKeywordByNameNum(KvtHandle section, const char* name, int instance)
                           KvtNodeKind::Keyword, name, instance);
 }
 
+KvtHandle kvtKeywordPeek(KvtHandle section, const char* name, int instance) {
+    return ChildByNameNum(section, {KvtNodeKind::Target, KvtNodeKind::Section},
+                          KvtNodeKind::Keyword, name, instance, false);
+}
+
 KvtHandle kvtChildByNum(KvtHandle node, int number) {
     KvtTree* tree = nullptr;
     const KvtNode* n = Node(
@@ -225,6 +260,13 @@ KvtHandle kvtParamByNum(KvtHandle keyword, int number) {
     return kvtChildByNum(keyword, number);
 }
 
+int kvtParamCount(KvtHandle keyword) {
+    const KvtNode* k = Node(keyword, {KvtNodeKind::Keyword});
+    if (k == nullptr) return 0;
+    KvtSetError(kKvtOk);
+    return static_cast<int>(k->children.size());
+}
+
 bool kvtIsKeyword(KvtHandle node) {
     int index = -1;
     const KvtTree* tree = KvtFindTree(node, &index);
@@ -239,6 +281,36 @@ int kvtGetLevel(KvtHandle node) {
     if (n == nullptr) return 0;
     KvtSetError(kKvtOk);
     return n->level;
+}
+
+int kvtGetLine(KvtHandle node) {
+    const KvtNode* n =
+        Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword});
+    if (n == nullptr) return 0;
+    KvtSetError(kKvtOk);
+    return n->line;
+}
+
+bool kvtIsRead(KvtHandle node) {
+    const KvtNode* n =
+        Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword});
+    if (n == nullptr) return false;
+    KvtSetError(kKvtOk);
+    return n->read;
+}
+
+const char* kvtGetAskedName(KvtHandle node, int number, bool* keyword) {
+    const KvtNode* n = Node(node, {KvtNodeKind::File, KvtNodeKind::Target, KvtNodeKind::Section});
+    if (n == nullptr) return nullptr;
+    if (n->asked == nullptr || number < 1 || number > static_cast<int>(n->asked->names.size())) {
+        KvtSetError(kKvtErrNotFound);
+        return nullptr;
+    }
+    const std::string& key = n->asked->names[number - 1];
+    if (keyword != nullptr)
+        *keyword = key[0] == static_cast<char>('0' + static_cast<int>(KvtNodeKind::Keyword));
+    KvtSetError(kKvtOk);
+    return key.c_str() + 1;
 }
 
 const char* kvtGetNameGlb(KvtHandle node) {

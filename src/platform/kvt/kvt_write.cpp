@@ -66,7 +66,9 @@ int AddText(KvtHandle file, KvtValueKind kind, const char* value) {
 
 // ---- writing -----------------------------------------------------------------
 
-void AppendReal(std::string& out, double value, bool single) {
+// With shortest, the fewest digits that read back the same value (for
+// messages); else a fixed count of digits.
+void AppendReal(std::string& out, double value, bool single, bool shortest) {
     if (std::isnan(value)) {
         out += std::signbit(value) ? "-nan" : "nan";
         return;
@@ -77,9 +79,11 @@ void AppendReal(std::string& out, double value, bool single) {
     }
     char buf[48];
     const auto r =
-        single ? std::to_chars(buf, buf + sizeof buf, static_cast<float>(value),
-                               std::chars_format::general, 9)
-               : std::to_chars(buf, buf + sizeof buf, value, std::chars_format::general, 17);
+        shortest ? (single ? std::to_chars(buf, buf + sizeof buf, static_cast<float>(value))
+                           : std::to_chars(buf, buf + sizeof buf, value))
+        : single ? std::to_chars(buf, buf + sizeof buf, static_cast<float>(value),
+                                 std::chars_format::general, 9)
+                 : std::to_chars(buf, buf + sizeof buf, value, std::chars_format::general, 17);
     const std::string text(buf, r.ptr);
     out += text;
     // "12" would load back as an integer.
@@ -95,13 +99,13 @@ void AppendQuoted(std::string& out, const std::string& text) {
     out += '"';
 }
 
-void AppendParam(std::string& out, const KvtNode& p) {
+void AppendParam(std::string& out, const KvtNode& p, bool shortest = false) {
     switch (p.valueKind) {
         case KvtValueKind::Integer:
             out += std::to_string(p.integer);
             break;
         case KvtValueKind::Real:
-            AppendReal(out, p.real, p.single);
+            AppendReal(out, p.real, p.single, shortest);
             break;
         case KvtValueKind::Logical:
             out += p.logical ? "true" : "false";
@@ -218,6 +222,20 @@ int kvtAddString(KvtHandle file, const char* value) {
 
 int kvtAddFilename(KvtHandle file, const char* value) {
     return AddText(file, KvtValueKind::Filename, value);
+}
+
+const char* kvtGetParamText(KvtHandle param) {
+    int index = -1;
+    KvtTree* tree = KvtFindTree(param, &index);
+    if (tree == nullptr) return nullptr;
+    KvtNode& p = tree->nodes[index];
+    if (p.kind != KvtNodeKind::Param) {
+        KvtSetError(kKvtErrHandle);
+        return nullptr;
+    }
+    if (p.globalName.empty()) AppendParam(p.globalName, p, true);
+    KvtSetError(kKvtOk);
+    return p.globalName.c_str();
 }
 
 int kvtWrite(KvtHandle file, const char* path) {

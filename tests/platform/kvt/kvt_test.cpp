@@ -4,6 +4,7 @@
 #include "platform/kvt/kvt.hpp"
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <cfloat>
 #include <climits>
@@ -12,6 +13,7 @@
 #include <filesystem>
 #include <string>
 #include <tuple>
+#include <vector>
 
 #include "platform/kvt/kvt_compare.hpp"
 #include "support/test_support.hpp"
@@ -317,6 +319,136 @@ TEST(KvtFiles, RelativeAndAbsoluteNamesAndUnreadableFiles) {
     EXPECT_EQ(kvtLoadFile(fs::temp_directory_path().c_str(), -1, &file), 0u);
     EXPECT_EQ(file, 0u);
     EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrFile);
+    EXPECT_STREQ(kvtGetFileErrorText(), "Is a directory");
+    // The reason is kept for a file that is there but can't be read, and
+    // cleared by the next load; an absent file has none.
+    bwtest::TempDir dir;
+    bwtest::WriteFile(dir / "locked.bw", "T {\n}\n");
+    fs::permissions(dir / "locked.bw", fs::perms::none);
+    if (geteuid() != 0) {  // root reads any file
+        EXPECT_EQ(kvtLoadFile((dir / "locked.bw").c_str(), -1, &file), 0u);
+        EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrFile);
+        EXPECT_STREQ(kvtGetFileErrorText(), "Permission denied");
+    }
+    EXPECT_EQ(kvtLoadFile((dir / "absent.bw").c_str(), -1, &file), 0u);
+    EXPECT_STREQ(kvtGetFileErrorText(), "");
+    EXPECT_EQ(kvtLoadFile("/dev/null", -1, &file), 0u);
+    EXPECT_STREQ(kvtGetFileErrorText(), "not a regular file");
+}
+
+// Lines of names (a block opening lines below its name counts from the
+// name), read marks set by the look-ups by name only, and the names asked for
+// in each node: found or not, each once, keywords told from sections. A peek
+// reads nothing.
+TEST(KvtMarks, LinesMarksAskedNamesAndTexts) {
+    KvtHandle file = Load(
+        "# head\nT {\n  S\n  {\n    k = 1, 2.5, 1e40, -inf, \"a \\\"b\\\"\", file(\"x.nc\"), true\n"
+        "  }\n  k = 9\n}\n");
+    const KvtHandle t = kvtChildByNum(file, 1), s = kvtChildByNum(t, 1);
+    const KvtHandle k = kvtChildByNum(s, 1), top = kvtChildByNum(t, 2);
+    EXPECT_EQ(std::to_string(kvtGetLine(t)) + std::to_string(kvtGetLine(s)) +
+                  std::to_string(kvtGetLine(k)) + std::to_string(kvtGetLine(top)),
+              "2357");
+    EXPECT_FALSE(kvtIsRead(t) || kvtIsRead(s) || kvtIsRead(k) || kvtIsRead(top));
+    EXPECT_EQ(kvtKeywordPeek(t, "k", 1), top);
+    EXPECT_EQ(kvtGetAskedName(t, 1, nullptr), nullptr);
+    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrNotFound);
+    EXPECT_EQ(Target(file), t);
+    EXPECT_EQ(kvtSectionByNameNum(t, "S", 2), 0u);  // asked, not found
+    EXPECT_EQ(kvtKeywordByNameNum(t, "S", 1), 0u);  // a keyword of the section's name
+    EXPECT_EQ(kvtSectionByNameNum(t, "S", 1), s);   // asked again: kept once
+    EXPECT_EQ(kvtKeywordByNameNum(t, "Gone", 1), 0u);
+    EXPECT_TRUE(kvtIsRead(t) && kvtIsRead(s) && !kvtIsRead(k) && !kvtIsRead(top));
+    std::string asked;
+    bool keyword = false;
+    for (int n = 1; const char* name = kvtGetAskedName(t, n, &keyword); ++n)
+        asked += std::string(keyword ? "k:" : "s:") + name + " ";
+    EXPECT_EQ(asked, "s:S k:S k:Gone ");
+    EXPECT_STREQ(kvtGetAskedName(file, 1, &keyword), "T");
+    EXPECT_FALSE(keyword);
+
+    // Parameters as messages show them; a built tree has no lines.
+    std::string texts;
+    for (int n = 1; n <= kvtParamCount(k); ++n)
+        texts += std::string(kvtGetParamText(kvtParamByNum(k, n))) + "|";
+    EXPECT_EQ(texts, "1|2.5|1e+40|-inf|\"a \\\"b\\\"\"|file(\"x.nc\")|true|");
+    EXPECT_EQ(kvtGetParamText(k), nullptr);
+    kvtClose(&file);
+    kvtCreate(&file);
+    kvtAddTarget(file, "B");
+    EXPECT_EQ(kvtGetLine(Target(file, "B")), 0);
+    kvtClose(&file);
+}
+
+// The texts the report gives a file a run has read in part.
+std::vector<std::string> Report(KvtHandle file) {
+    std::vector<std::string> texts;
+    const int count = kvtReportUnread(
+        file,
+        [](const char* text, void* data) {
+            static_cast<std::vector<std::string>*>(data)->push_back(text);
+        },
+        &texts);
+    EXPECT_EQ(count, static_cast<int>(texts.size()));
+    return texts;
+}
+
+// What a run leaves unread, in file order: a misspelt key and one in the
+// wrong case get the nearest name of their kind asked for in their section,
+// a far name none; an unread section is one warning for all it holds; a repeat of a
+// key or section that was read names both lines, one warning per repeat; a
+// second instance read by its number is no repeat; an unread target too.
+TEST(KvtReport, UnreadNamesWithTheNearestAskedAndRepeats) {
+    KvtHandle file = Load(
+        "MODEL {\n"                        // 1
+        "  Period {\n"                     // 2
+        "    Time_step_intervall = 0.1\n"  // 3
+        "    time_step_count = 40\n"       // 4
+        "    Depth = 3\n"                  // 5
+        "    Warm_up = 1\n"                // 6
+        "    Warm_up = 2\n"                // 7
+        "    Warm_up = 3\n"                // 8
+        "    Point = 1\n"                  // 9
+        "    Point = 2\n"                  // 10
+        "  }\n"                            // 11
+        "  Extra { a = 1\n b = 2 }\n"      // 12, 13
+        "  Period { c = 1 }\n"             // 14
+        "  Data_File { c = 1 }\n"          // 15
+        "}\n"                              // 16
+        "OTHER { }\n");                    // 17
+    const KvtHandle model = Target(file, "MODEL"), period = kvtSectionByNameNum(model, "Period", 1);
+    for (const char* name : {"Time_step_interval", "Time_step_count", "Warm_up", "Colors"})
+        kvtKeywordByNameNum(period, name, 1);
+    kvtKeywordByNameNum(period, "Point", 1);
+    kvtKeywordByNameNum(period, "Point", 2);
+    kvtSectionByNameNum(model, "DATA_FILE", 1);
+    EXPECT_EQ(Report(file),
+              (std::vector<std::string>{
+                  "Key Time_step_intervall in section Period (line 3) is not read by this run; "
+                  "did you mean Time_step_interval?",
+                  "Key time_step_count in section Period (line 4) is not read by this run; did "
+                  "you mean Time_step_count?",
+                  "Key Depth in section Period (line 5) is not read by this run",
+                  "Key Warm_up in section Period is given twice, on lines 6 and 7; the one on "
+                  "line 6 stands",
+                  "Key Warm_up in section Period is given twice, on lines 6 and 8; the one on "
+                  "line 6 stands",
+                  "Section Extra in target MODEL (line 12) is not read by this run",
+                  "Section Period in target MODEL is given twice, on lines 2 and 14; the one on "
+                  "line 2 stands",
+                  "Section Data_File in target MODEL (line 15) is not read by this run; did you "
+                  "mean DATA_FILE?",
+                  "Target OTHER (line 17) is not read by this run",
+              }));
+    // A section found shows what it holds; a target found is read.
+    kvtTargetByNameNum(file, "OTHER", 1);
+    kvtSectionByNameNum(model, "Extra", 1);
+    const std::vector<std::string> after = Report(file);
+    ASSERT_EQ(after.size(), 9u);
+    EXPECT_EQ(after[5] + "/" + after[6],
+              "Key a in section Extra (line 12) is not read by this run/"
+              "Key b in section Extra (line 13) is not read by this run");
+    kvtClose(&file);
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "input/kvt_access.hpp"
 
+#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <ctime>
@@ -69,12 +70,14 @@ KvtHandle KvtOpenFile(std::string_view path, bool makeLog, int* status) {
     const std::string name(TrimRight(path));
     KvtHandle file = 0;
     kvtLoadFile(name.c_str(), -1, &file);
+    gKvtAccess.loadFailure = file == 0 ? kvtGetFileErrorText() : "";
     if (file == 0) {
         if (status != nullptr) {
             *status = -1;
             return 0;
         }
-        StopRun("KVT file: " + name + "not found");
+        if (gKvtAccess.loadFailure.empty()) StopRun("KVT file: " + name + "not found");
+        StopRun("KVT file: " + name + " can not be read: " + gKvtAccess.loadFailure);
     }
     if (makeLog) {
         gKvtAccess.logName = LogFileName(name);
@@ -89,6 +92,10 @@ KvtHandle KvtOpenFile(std::string_view path, bool makeLog, int* status) {
     }
     if (status != nullptr) *status = 0;
     return file;
+}
+
+std::string KvtLoadFailure() {
+    return gKvtAccess.loadFailure;
 }
 
 KvtHandle KvtOpenTarget(KvtHandle file, std::string_view name, int instance, int* status) {
@@ -177,11 +184,11 @@ int KvtGetParam(KvtHandle keyword, int param, KvtKind kind, KvtFetched& out) {
 }
 
 int KvtGetKey(KvtHandle section, std::string_view key, int instance, int param, KvtKind kind,
-              KvtFetched& out, std::string& echo, bool& present) {
+              KvtFetched& out, std::string& echo, KvtHandle& keyword) {
     const std::string name(TrimRight(key));
     echo = Indent(section) + name + " : ";
-    const KvtHandle keyword = kvtKeywordByNameNum(section, name.c_str(), instance);
-    present = keyword != 0;
+    keyword = kvtKeywordByNameNum(section, name.c_str(), instance);
+    const bool present = keyword != 0;
     if (!present) return 1;
     return KvtGetParam(keyword, param, kind, out);
 }
@@ -197,6 +204,74 @@ std::string PathForEcho(const std::string& path) {
     return sep == std::string::npos ? path : path.substr(sep + 1);
 }
 
+constexpr const char* kWholeNumber = "a whole number from -2147483648 to 2147483647 is expected";
+
+// Why a parameter fetched with code can't be meant, or "" when it can.
+std::string Unmeant(KvtKind kind, int code, const KvtFetched& f) {
+    const bool range = code == kKvtErrRange;
+    if (code != 0) {
+        switch (kind) {
+            case KvtKind::Integer:
+                return std::string(range ? "is beyond the 32-bit integer range; "
+                                         : "is not an integer; ") +
+                       kWholeNumber;
+            case KvtKind::Double:
+            case KvtKind::Real:
+                return "is not a number; a real or an integer is expected";
+            case KvtKind::Logical:
+                return std::string(range ? "is beyond the 32-bit integer range"
+                                         : "is not a logical") +
+                       "; true, false or an integer is expected";
+            case KvtKind::String:
+                return "is not a text; a quoted text is expected";
+            case KvtKind::Filename:
+                return range ? "is a path of more than 2047 characters; a shorter one is expected"
+                             : "is not a file name; file(\"name\") or a quoted text is expected";
+        }
+    }
+    if (kind != KvtKind::Double && kind != KvtKind::Real) return "";
+    if (!std::isfinite(f.number)) return "is not a finite number";
+    if (kind == KvtKind::Real && std::isinf(static_cast<float>(f.number)))
+        return "is beyond the 32-bit real range; a magnitude of at most 3.4028235e+38 is expected";
+    return "";
+}
+
+// Stops the run on a present key whose value can't be meant, after its echo
+// line (the values as written), so that the log shows where reading stopped.
+// number > 0 names the value at fault among several.
+[[noreturn]] void Refuse(const char* getter, KvtHandle section, KvtHandle keyword, int number,
+                         const std::string& echo, const std::string& why) {
+    std::string values;
+    const int count = kvtParamCount(keyword);
+    for (int i = 1; i <= count; ++i)
+        values += (i > 1 ? ", " : "") + std::string(kvtGetParamText(kvtParamByNum(keyword, i)));
+    KvtLogLine(echo + values);
+    std::string text = std::string(getter) + ": ";
+    if (number > 0 && count > 1) text += "value " + std::to_string(number) + " of ";
+    text += std::string(kvtGetName(keyword)) + " = " + values;
+    text += (kvtGetLevel(section) == 0 ? " in target " : " in section ") +
+            std::string(kvtGetName(section));
+    text += " (line " + std::to_string(kvtGetLine(keyword)) + ") " + why;
+    StopRun(text);
+}
+
+std::string ValueCount(int count) {
+    return std::to_string(count) + (count == 1 ? " value" : " values");
+}
+
+// A check of this layer, not of the plain library (which keeps the default
+// without a word): a present key whose value can't be meant stops the run.
+void RefuseUnmeant(const char* getter, KvtHandle section, KvtHandle keyword, int param,
+                   KvtKind kind, int code, const KvtFetched& f, const std::string& echo) {
+    if (code == 1) {
+        Refuse(getter, section, keyword, 0, echo,
+               "gives " + ValueCount(kvtParamCount(keyword)) + " where at least " +
+                   std::to_string(param) + " are needed");
+    }
+    const std::string why = Unmeant(kind, code, f);
+    if (!why.empty()) Refuse(getter, section, keyword, param, echo, why);
+}
+
 // Ends a getter: the echo line and the status.
 void FinishGetter(std::string& echo, bool present, int code, const std::string& valueText,
                   const std::string& defaultText, int* status) {
@@ -210,13 +285,18 @@ void FinishGetter(std::string& echo, bool present, int code, const std::string& 
 
 // The course of every getter: look the key up, fetch its parameter, take the
 // value, and echo what was read or the default.
+// Without a status a present key must hold a value that can be meant.
 template <typename T, typename Take, typename ReadText, typename ValueText>
-void GetSetting(KvtHandle section, std::string_view key, T& value, int instance, int param,
-                int* status, KvtKind kind, Take take, ReadText readText, ValueText valueText) {
+void GetSetting(const char* getter, KvtHandle section, std::string_view key, T& value, int instance,
+                int param, int* status, KvtKind kind, Take take, ReadText readText,
+                ValueText valueText) {
     KvtFetched f;
     std::string echo;
-    bool present = false;
-    const int code = KvtGetKey(section, key, instance, param, kind, f, echo, present);
+    KvtHandle keyword = 0;
+    const int code = KvtGetKey(section, key, instance, param, kind, f, echo, keyword);
+    const bool present = keyword != 0;
+    if (present && status == nullptr)
+        RefuseUnmeant(getter, section, keyword, param, kind, code, f, echo);
     if (present && code == 0) take(f, value);
     FinishGetter(echo, present, code, readText(f), valueText(value), status);
 }
@@ -230,7 +310,7 @@ std::string FetchedNumber(const KvtFetched& f) {
 void KvtGetDouble(KvtHandle section, std::string_view key, double& value, int instance, int param,
                   int* status) {
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::Double,
+        "KvtGetDouble", section, key, value, instance, param, status, KvtKind::Double,
         [](const KvtFetched& f, double& v) { v = f.number; }, FetchedNumber,
         [](double v) { return NumberText(v); });
 }
@@ -239,7 +319,7 @@ void KvtGetReal(KvtHandle section, std::string_view key, float& value, int insta
                 int* status) {
     // Read as 64 bits and echoed so; stored as 32 bits.
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::Real,
+        "KvtGetReal", section, key, value, instance, param, status, KvtKind::Real,
         [](const KvtFetched& f, float& v) { v = static_cast<float>(f.number); }, FetchedNumber,
         [](float v) { return NumberText(static_cast<double>(v)); });
 }
@@ -247,7 +327,7 @@ void KvtGetReal(KvtHandle section, std::string_view key, float& value, int insta
 void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int instance, int param,
                    int* status) {
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::Integer,
+        "KvtGetInteger", section, key, value, instance, param, status, KvtKind::Integer,
         [](const KvtFetched& f, int32_t& v) { v = f.integer; },
         [](const KvtFetched& f) { return std::to_string(f.integer); },
         [](int32_t v) { return std::to_string(v); });
@@ -256,7 +336,7 @@ void KvtGetInteger(KvtHandle section, std::string_view key, int32_t& value, int 
 void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int instance, int param,
                    int* status) {
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::Logical,
+        "KvtGetLogical", section, key, value, instance, param, status, KvtKind::Logical,
         [](const KvtFetched& f, bool& v) { v = f.logical; },
         [](const KvtFetched& f) { return LogicalText(f.logical); }, LogicalText);
 }
@@ -264,7 +344,7 @@ void KvtGetLogical(KvtHandle section, std::string_view key, bool& value, int ins
 void KvtGetString(KvtHandle section, std::string_view key, std::string& value, int width,
                   int instance, int param, int* status) {
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::String,
+        "KvtGetString", section, key, value, instance, param, status, KvtKind::String,
         [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
         [](const KvtFetched& f) { return std::string(TrimRight(f.text)); },
         [](const std::string& v) { return std::string(TrimRight(v)); });
@@ -273,7 +353,7 @@ void KvtGetString(KvtHandle section, std::string_view key, std::string& value, i
 void KvtGetFilename(KvtHandle section, std::string_view key, std::string& value, int width,
                     int instance, int param, int* status) {
     GetSetting(
-        section, key, value, instance, param, status, KvtKind::Filename,
+        "KvtGetFilename", section, key, value, instance, param, status, KvtKind::Filename,
         [width](const KvtFetched& f, std::string& v) { v = FitWidth(f.text, width); },
         [](const KvtFetched& f) { return PathForEcho(std::string(TrimRight(f.text))); },
         [](const std::string& v) { return std::string(TrimRight(v)); });
@@ -293,9 +373,10 @@ std::string KvtTrimmedFilename(KvtHandle section, std::string_view key, int widt
 
 namespace {
 
+// Without a status a present key must give count values, each one that can be meant.
 template <typename T>
-void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtKind kind,
-             int* status) {
+void GetList(const char* getter, KvtHandle section, std::string_view key, T* values, int count,
+             KvtKind kind, int* status) {
     const std::string name(TrimRight(key));
     std::string echo = Indent(section) + name + " : ";
     const KvtHandle keyword = kvtKeywordByNameNum(section, name.c_str(), 1);
@@ -312,10 +393,17 @@ void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtK
         if (status != nullptr) *status = 1;
         return;
     }
+    const std::string head = echo;
+    if (status == nullptr && kvtParamCount(keyword) < count) {
+        Refuse(getter, section, keyword, 0, head,
+               "gives " + ValueCount(kvtParamCount(keyword)) + " where " + std::to_string(count) +
+                   " are needed");
+    }
     int code = 0;
     for (int i = 0; i < count; ++i) {
         KvtFetched f;
         code = KvtGetParam(keyword, i + 1, kind, f);
+        if (status == nullptr) RefuseUnmeant(getter, section, keyword, i + 1, kind, code, f, head);
         if (code != 0) continue;
         if constexpr (std::is_same_v<T, double>)
             values[i] = f.number;
@@ -331,10 +419,20 @@ void GetList(KvtHandle section, std::string_view key, T* values, int count, KvtK
 
 void KvtGetIntegerList(KvtHandle section, std::string_view key, int32_t* values, int count,
                        int* status) {
-    GetList(section, key, values, count, KvtKind::Integer, status);
+    GetList("KvtGetIntegerList", section, key, values, count, KvtKind::Integer, status);
 }
 
 void KvtGetDoubleList(KvtHandle section, std::string_view key, double* values, int count,
                       int* status) {
-    GetList(section, key, values, count, KvtKind::Double, status);
+    GetList("KvtGetDoubleList", section, key, values, count, KvtKind::Double, status);
+}
+
+int KvtParamCount(KvtHandle section, std::string_view key) {
+    const std::string name(TrimRight(key));
+    return kvtParamCount(kvtKeywordPeek(section, name.c_str(), 1));
+}
+
+void KvtWarnUnread(KvtHandle file) {
+    kvtReportUnread(
+        file, [](const char* text, void*) { ReportUserWarning(text); }, nullptr);
 }

@@ -6,9 +6,15 @@
 //    passes a status and decides for itself;
 //  - an echo of every value into the run's log, defaults marked " (default)",
 //    so that the log records every setting in force;
-//  - values in the model's own widths.
+//  - values in the model's own widths;
+//  - without a status, a fatal stop on a present key whose value can't be
+//    meant: of the wrong kind, an integer beyond 32 bits, a real that is nan
+//    or infinite (or beyond the 32-bit range where a 32-bit real is read),
+//    fewer values than are read. The message names the getter, the key, its
+//    section, its line, the values as written and what is allowed.
 // A status, where given, is 0 when the key was there and its value taken,
-// 1 when it was absent or has no such parameter, else the library's code.
+// 1 when it was absent or has no such parameter, else the library's code;
+// then nothing is refused and a value that can't be taken keeps the default.
 #pragma once
 
 #include <cstdint>
@@ -22,14 +28,22 @@ struct KvtAccessState {
     std::string logName;        // the log's path, once opened
     KvtHandle currentFile = 0;  // the file and node of the current-section face
     KvtHandle currentNode = 0;
-    int targetInstance = 1;  // the instance last given to the current face's KvtOpenTarget
+    int targetInstance = 1;   // the instance last given to the current face's KvtOpenTarget
+    std::string loadFailure;  // why the last KvtOpenFile could not load its file
 };
 extern KvtAccessState gKvtAccess;
 
 // Loads the parameter file and, with makeLog, opens the log beside it: the
 // path with its extension replaced by ".log" (appended where there is none),
-// and "_p" with the process id behind the stem under a launcher.
+// and "_p" with the process id behind the stem under a launcher. Without a
+// status a file that is absent stops with "KVT file: <path>not found", one
+// that is there but can't be read with "KVT file: <path> can not be read:
+// <reason>".
 KvtHandle KvtOpenFile(std::string_view path, bool makeLog, int* status = nullptr);
+// Why the last KvtOpenFile could not load its file: the system's text
+// ("Permission denied", "Is a directory", ...); "" when the file does not
+// exist or the load succeeded.
+std::string KvtLoadFailure();
 // The log's name for a parameter file path.
 std::string LogFileName(std::string_view path);
 
@@ -65,6 +79,17 @@ void KvtGetIntegerList(KvtHandle section, std::string_view key, int32_t* values,
                        int* status = nullptr);
 void KvtGetDoubleList(KvtHandle section, std::string_view key, double* values, int count,
                       int* status = nullptr);
+
+// The number of parameters of the first instance of a key, 0 when it is
+// absent; no echo, and the key does not count as read (a count key is
+// weighed against the list it sizes before the list is read).
+int KvtParamCount(KvtHandle section, std::string_view key);
+
+// Once the whole model is read: a warning, in the log and on the screen, for
+// each target, section or keyword of the file that no look-up found (with the
+// nearest name the run asked for in its place, when one is close) and for
+// each repeat of a name of which one instance was read.
+void KvtWarnUnread(KvtHandle file);
 
 // Writes one line into the log of this layer (nothing when it is not open).
 void KvtLogLine(std::string_view text);

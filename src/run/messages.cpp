@@ -109,6 +109,16 @@ void ReportWarning(std::string_view text) {
     WritePieces(text, "Warning: ", 61);
 }
 
+void ReportUserWarning(std::string_view text) {
+    ReportWarning(text);
+    if (gMessages.logUnit <= 0) return;
+    const char* buildMode = std::getenv("BUILDMODE");
+    if (buildMode != nullptr && std::strcmp(buildMode, "NIGHT") == 0) return;
+    const std::string line(TrimRight(text));
+    std::printf("Warning: %s\n", line.c_str());
+    std::fflush(stdout);
+}
+
 void ReportFatal(std::string_view text) {
     WritePieces(text, "Fatal error: ", 57);
     NormalExit(kExitFatal);

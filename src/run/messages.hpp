@@ -35,6 +35,11 @@ void WriteLogPart(std::string_view text);
 
 // "Warning: " message in pieces of 61 characters; the run goes on.
 void ReportWarning(std::string_view text);
+// A warning the user must see before the run goes on: ReportWarning, and
+// "Warning: " with the text on standard output too while a log is open
+// (without a log the warning is there already), but not in a night build
+// (BUILDMODE "NIGHT").
+void ReportUserWarning(std::string_view text);
 // "Fatal error: " message in pieces of 57 characters, then NormalExit(1).
 [[noreturn]] void ReportFatal(std::string_view text);
 // The orderly stop: the text to the log and to the user, then the closing

@@ -45,6 +45,27 @@ TEST(MessageForms, WarningPieces) {
                                         pad + text.substr(122)}));
 }
 
+// A warning the user must see: in the log, and on the screen too but not in a
+// night build; without a log it is on the screen once, as any warning.
+TEST(MessageForms, UserWarningsOnTheScreenToo) {
+    const char* mode = std::getenv("BUILDMODE");
+    const std::string saved = mode != nullptr ? mode : "";
+    std::string screens;
+    for (const char* buildMode : {"", "NIGHT"}) {
+        setenv("BUILDMODE", buildMode, 1);
+        bwtest::LogCapture log;
+        testing::internal::CaptureStdout();
+        ReportUserWarning("look  ");
+        screens += testing::internal::GetCapturedStdout() + "|";
+        EXPECT_EQ(log.Lines(), (std::vector<std::string>{"", "Warning: look"}));
+    }
+    testing::internal::CaptureStdout();
+    ReportUserWarning("alone");
+    setenv("BUILDMODE", saved.c_str(), 1);
+    EXPECT_EQ(screens + testing::internal::GetCapturedStdout(),
+              "Warning: look\n||\nWarning: alone\n");
+}
+
 // Gives the message layer a log at path (in the child of a death test).
 void LogTo(const std::string& path) {
     const int unit = GetFreeUnit();

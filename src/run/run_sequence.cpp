@@ -14,7 +14,6 @@
 #include "run/units.hpp"
 #include "solver2d/time_loop.hpp"
 
-
 namespace {
 
 // The integer behind "-debug:"; the level stays as it is when that is no number.
@@ -74,7 +73,12 @@ void ReadCommandLine(int argc, const char* const* argv) {
 
     int status = 0;
     gRun.parameterFileHandle = KvtOpenFile(fileName, true, &status);
-    if (status != 0) StopRun(std::string(kProgramTitle) + ": Unable to open " + fileName);
+    if (status != 0) {
+        // A file that is there but can't be read says why.
+        const std::string reason = KvtLoadFailure();
+        StopRun(std::string(kProgramTitle) + ": Unable to open " + fileName +
+                (reason.empty() ? "" : ": " + reason));
+    }
     SetLogUnit(gKvtAccess.logUnit);
     // The channel opens once the file is known to be there, so that a mistyped
     // name leaves no progress file behind.
@@ -110,6 +114,8 @@ void RunMain(int argc, const char* const* argv) {
     StartTiming(gOverallTiming, kTaskPreProcessing);
 
     ReadModelSetup(gRun.parameterFileHandle, gRun.parameterFileName);
+    // What the file holds and no setting read: mistyped or misplaced keys.
+    KvtWarnUnread(gRun.parameterFileHandle);
     SetThreads(gProcess.maxThreads);
     StopTiming(gOverallTiming, kTaskPreProcessing);
 

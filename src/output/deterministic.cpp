@@ -6,6 +6,7 @@
 
 #include "data/geoframe.hpp"
 #include "input/kvt_access.hpp"
+#include "output/output_lock.hpp"
 #include "processes/rollers.hpp"
 #include "run/datetime.hpp"
 #include "run/messages.hpp"
@@ -112,7 +113,18 @@ void WriteRecord(OutputRecord2D& r) {
     XolFlush(r.file);
 }
 
-void ReadRange(KvtHandle section, const char* key, int32_t count, std::vector<int32_t>& range) {
+// A list of count values. The count comes from a key of its own (countKey,
+// or a fixed 3 for a range): a list that holds fewer values than the count
+// asks for is refused before room for the count is taken, a check the reader
+// adds so that a mistyped count cannot claim the machine's memory or leave
+// points at a default nobody gave.
+void ReadRange(KvtHandle section, const char* key, int32_t count, const std::string& asker,
+               int32_t number, std::vector<int32_t>& range) {
+    const int given = KvtParamCount(section, key);
+    if (given < count && (given > 0 || count > 1))
+        StopRun("SetupOutputDeterministic2D: " + std::string(key) + " of record " +
+                std::to_string(number) + " holds " + std::to_string(given) + " values, but " +
+                asker + " asks for " + std::to_string(count));
     range.assign(static_cast<size_t>(count), 0);
     KvtGetIntegerList(section, key, range.data(), count);
 }
@@ -164,8 +176,9 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
         r.noOfPoints = 1;
         KvtGetInteger(section, "NO_OF_POINTS", r.noOfPoints);
         atLeastOne(r.noOfPoints, "NO_OF_POINTS");
-        ReadRange(section, "X_Range_And_Interval", r.noOfPoints, r.xRange);
-        ReadRange(section, "Y_Range_And_Interval", r.noOfPoints, r.yRange);
+        const std::string points = "NO_OF_POINTS = " + std::to_string(r.noOfPoints);
+        ReadRange(section, "X_Range_And_Interval", r.noOfPoints, points, number, r.xRange);
+        ReadRange(section, "Y_Range_And_Interval", r.noOfPoints, points, number, r.yRange);
         for (int32_t p = 0; p < r.noOfPoints; ++p)
             if (r.xRange[p] < 0 || r.xRange[p] > g.J || r.yRange[p] < 0 || r.yRange[p] > g.K)
                 StopRun(
@@ -176,8 +189,9 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
         r.dimension = 0;
     } else {
         r.noOfPoints = 1;
-        ReadRange(section, "X_Range_And_Interval", 3, r.xRange);
-        ReadRange(section, "Y_Range_And_Interval", 3, r.yRange);
+        const std::string line = "a line or area record";
+        ReadRange(section, "X_Range_And_Interval", 3, line, number, r.xRange);
+        ReadRange(section, "Y_Range_And_Interval", 3, line, number, r.yRange);
         auto check = [&](const std::vector<int32_t>& range, int32_t top, const char* key) {
             if (range[0] < 0 || range[1] > top || range[0] > range[1] || range[2] < 1)
                 StopRun(Filled(Filled(std::string("SetupOutputDeterministic2D: ") + key +
@@ -200,7 +214,8 @@ void ReadOutputSpec(KvtHandle parent, int32_t number, const OutputSpecKeys& keys
     r.numberOfItems = 1;
     KvtGetInteger(section, "Number_Of_Items", r.numberOfItems);
     atLeastOne(r.numberOfItems, "Number_Of_Items");
-    ReadRange(section, "Item_Numbers", r.numberOfItems, r.itemNumbers);
+    const std::string items = "Number_Of_Items = " + std::to_string(r.numberOfItems);
+    ReadRange(section, "Item_Numbers", r.numberOfItems, items, number, r.itemNumbers);
     for (int32_t item : r.itemNumbers)
         if (item < 1 || item > keys.maxItem) StopRun(kWrongItem);
     r.title = KvtTrimmedString(section, "Title", 40);
@@ -213,9 +228,10 @@ void SetupOutputDeterministic2D(KvtHandle target) {
     int32_t number = 0;
     KvtGetInteger(section, "Number_Of_Records", number);
     gOutputDet.numberOfRecords = std::max(number, 0);
-    gOutputDet.records.resize(static_cast<size_t>(gOutputDet.numberOfRecords));
+    // Record by record as their sections are found: a count beyond the
+    // sections stops at the first one missing, before room for it is taken.
     for (int32_t n = 1; n <= gOutputDet.numberOfRecords; ++n)
-        ReadOutputSpec(section, n, OutputSpecKeys{}, gOutputDet.records[n - 1]);
+        ReadOutputSpec(section, n, OutputSpecKeys{}, gOutputDet.records.emplace_back());
 }
 
 void SetStepTimeAxis(XolFile& file, int32_t startStep, int32_t stepInterval) {
@@ -294,6 +310,7 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
 
 void CreateOutputDeterministic() {
     for (OutputRecord2D& r : gOutputDet.records) {
+        LockOutputFile("CreateOutputDeterministic", r.fileName);
         CreateOutputRecordFile(r, kDeterministicItems, r.firstStep, r.stepInterval,
                                DeterministicDataType(r));
         if (r.firstStep == 0) WriteRecord(r);
@@ -310,6 +327,7 @@ void CloseOutputDeterministic() {
         if (r.file.mode != 2 || r.file.file == 0) continue;
         XolFlush(r.file);
         XolClose(r.file);
+        UnlockOutputFile(r.fileName);
         XolPrintSummary(r.file);
     }
 }

@@ -8,6 +8,7 @@
 #include <new>
 #include <string>
 
+#include "output/output_lock.hpp"
 #include "run/datetime.hpp"
 #include "run/messages.hpp"
 #include "run/units.hpp"
@@ -148,6 +149,7 @@ void SetupDisturbanceAreas() {
     std::error_code error;
     const std::filesystem::path folder = std::filesystem::path(d.areaFileName).parent_path();
     if (!folder.empty()) std::filesystem::create_directories(folder, error);
+    LockOutputFile("SetupDisturbanceAreas", d.areaFileName);
     s.reportUnit = GetFreeUnit();
     if (s.reportUnit <= 0 || !OpenUnit(s.reportUnit, d.areaFileName, "w")) {
         s.reportUnit = 0;
@@ -203,6 +205,7 @@ void CreateOutputDisturbance() {
     SetStepTimeAxis(s.file, d.firstStep + d.stepInterval, d.stepInterval);
     XolSetMisc(s.file, 4, g.landValue);
     SetGridProjection(s.file, 0.0, 0.0);
+    LockOutputFile("CreateOutputDisturbance", d.fileName);
     int status = 0;
     XolCreateFile(s.file, d.fileName, &status);
     if (status != 0) StopRun("Unable to open " + d.fileName);
@@ -305,10 +308,12 @@ void CloseOutputDisturbance() {
     if (s.file.mode == 2 && s.file.file != 0) {
         XolFlush(s.file);
         XolClose(s.file);
+        UnlockOutputFile(gDisturbanceOutput.fileName);
         XolPrintSummary(s.file);
     }
     s.samples = {}, s.firstStep = {}, s.risen = {};
     s.sumEta = {}, s.sumEta2 = {}, s.work = {};
     if (s.reportUnit > 0) ReleaseUnit(s.reportUnit);
+    if (s.reportUnit > 0) UnlockOutputFile(gDisturbanceOutput.areaFileName);
     s.reportUnit = 0;
 }

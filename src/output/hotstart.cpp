@@ -22,6 +22,7 @@
 #include <new>
 
 #include "data/xolfile.hpp"
+#include "output/output_lock.hpp"
 #include "processes/internal_generation.hpp"
 #include "processes/rollers.hpp"
 #include "run/datetime.hpp"
@@ -136,6 +137,10 @@ void WriteOutputHotstart(int32_t step) {
     SetStepTimeAxis(f, step, 1);
     const DateTime date = AddSeconds(g.start, step * g.dt);
 
+    if (!gHotstartState.locked) {
+        LockOutputFile("WriteOutputHotstart", h.fileName);
+        gHotstartState.locked = true;
+    }
     const std::string temporary = HotstartTemporaryName(h.fileName);
     int status = 0;
     XolCreateFile(f, temporary, &status);

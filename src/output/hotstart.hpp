@@ -22,6 +22,7 @@ extern const OutputItemInfo kHotstartItemInfo[kHotstartItems];
 // What the writer keeps from one due step to the next.
 struct HotstartOutputState {
     std::vector<float> item;  // one item over the grid, built for the items 1 and 11 to 18
+    bool locked = false;      // the file's lock is taken (output_lock.hpp)
 };
 extern HotstartOutputState gHotstartState;
 

@@ -19,8 +19,7 @@ constexpr int32_t kStatisticItems = 17;
 constexpr int32_t kDisturbanceItems = 3;
 
 void CheckInterval(int32_t interval, const char* section) {
-    if (interval < 1)
-        StopRun(std::string(section) + ": Time_Step_Interval must be at least 1");
+    if (interval < 1) StopRun(std::string(section) + ": Time_Step_Interval must be at least 1");
 }
 
 }  // namespace
@@ -41,13 +40,13 @@ void SetupOutputStatistic2D(KvtHandle target) {
     KvtGetReal(section, "Eps_Low", s.epsLow);
     KvtGetInteger(section, "Number_Of_Records", s.numberOfRecords);
     s.numberOfRecords = std::max(s.numberOfRecords, 0);
-    s.records.resize(static_cast<size_t>(s.numberOfRecords));
     OutputSpecKeys keys;
     keys.timeSpan = false;
     keys.typeOfLand = false;
     keys.maxItem = kStatisticItems;
     for (int32_t n = 1; n <= s.numberOfRecords; ++n) {
-        OutputRecord2D& r = s.records[n - 1];
+        // Record by record, as the deterministic records are read.
+        OutputRecord2D& r = s.records.emplace_back();
         ReadOutputSpec(section, n, keys, r);
         r.firstStep = s.firstStep, r.lastStep = s.lastStep, r.stepInterval = s.stepInterval;
     }
@@ -71,9 +70,9 @@ void SetupOutputDisturbance2D(KvtHandle target) {
         KvtGetIntegerList(section, "Grid_Point", d.gridPoint, 2);
     if (d.scalingType != 1 && (d.gridPoint[0] < 0 || d.gridPoint[0] > gGrid.J ||
                                d.gridPoint[1] < 0 || d.gridPoint[1] > gGrid.K))
-        StopRun(Filled(Filled("Output_Disturbance_2D: Grid_Point (%,%) lies outside the grid",
-                              d.gridPoint[0]),
-                       d.gridPoint[1]));
+        StopRun(Filled(
+            Filled("Output_Disturbance_2D: Grid_Point (%,%) lies outside the grid", d.gridPoint[0]),
+            d.gridPoint[1]));
     KvtGetReal(section, "Eps_High", d.epsHigh);
     KvtGetReal(section, "Eps_Low", d.epsLow);
     KvtGetInteger(section, "Number_of_Items", d.numberOfItems);

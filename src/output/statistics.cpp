@@ -5,6 +5,7 @@
 #include <new>
 
 #include "output/deterministic.hpp"
+#include "output/output_lock.hpp"
 #include "processes/rollers.hpp"
 #include "run/messages.hpp"
 #include "solver2d/model_state.hpp"
@@ -258,9 +259,11 @@ void InitOutputStatistic() {
 
 void CreateOutputStatistic() {
     const StatisticSettings& set = gStatisticOutput;
-    for (OutputRecord2D& r : gStatisticOutput.records)
+    for (OutputRecord2D& r : gStatisticOutput.records) {
+        LockOutputFile("CreateOutputStatistic", r.fileName);
         CreateOutputRecordFile(r, kStatisticItems, set.firstStep + set.stepInterval,
                                set.stepInterval, 0);
+    }
 }
 
 void UpdateOutputStatistic(int32_t step) {
@@ -287,6 +290,7 @@ void CloseOutputStatistic() {
         if (r.file.mode != 2 || r.file.file == 0) continue;
         XolFlush(r.file);
         XolClose(r.file);
+        UnlockOutputFile(r.fileName);
         XolPrintSummary(r.file);
     }
     gStatistics = StatisticState{};

@@ -223,10 +223,9 @@ XolHandle xolItemS(XolHandle staticItem) {
 }
 
 int xolStaticDestroy(XolHandle staticItem) {
-    XolItemRec* it = XolItemOf(staticItem);
-    if (it == nullptr) return XolFail(kXolErrArgument, "not a static item");
-    it->data.clear();
-    it->data.shrink_to_fit();
+    // A static item keeps no values: they are read when asked for. The
+    // handle stays valid with its header.
+    if (XolItemOf(staticItem) == nullptr) return XolFail(kXolErrArgument, "not a static item");
     return 0;
 }
 

@@ -1,6 +1,7 @@
 // The records behind the data-file library's handles.
 #pragma once
 
+#include <cstdint>
 #include <deque>
 #include <memory>
 #include <string>
@@ -26,7 +27,7 @@ struct XolItemRec {
     bool anyValue = false;
     // On disk.
     int varid = -1;
-    std::vector<float> data;  // a static item's values, when read
+    struct XolFileRec* source = nullptr;  // the open file a read item comes from
 
     size_t Size() const {
         size_t n = 1;
@@ -84,4 +85,17 @@ XolHandle XolRegister(XolHeaderRec* header);
 XolHandle XolRegister(XolFileRec* file);
 XolHandle XolRegister(XolItemRec* item);
 void XolForget(const void* record);
+// Keeps text as the last failure's reason (what xolLastErrorText gives) and returns code.
 int XolFail(int code, const std::string& text);
+
+// A failure of the NetCDF library: its text for status, after what where given.
+int XolNcFail(int code, int status, const std::string& what = "");
+// Converts n values between the item's unit on disk and the unit they pass in
+// (toDisk: for writing), delete values left as they are.
+void XolConvert(const XolItemRec& item, float* values, size_t n, bool toDisk, float deleteValue);
+
+// The operating system's text of an errno value, starting in lower case.
+std::string XolSystemText(int error);
+// Checks a file before the NetCDF library opens it (xolio_check.cpp): 0, or
+// the code of the failure with its reason. fileSize is the file's size.
+int XolCheckFile(const std::string& path, uint64_t& fileSize);

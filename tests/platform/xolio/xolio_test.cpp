@@ -4,10 +4,14 @@
 #include "platform/xolio/xolio.hpp"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
 #include <iomanip>
 #include <sstream>
 #include <tuple>
@@ -17,6 +21,8 @@
 #include "support/test_support.hpp"
 
 namespace {
+
+namespace fs = std::filesystem;
 
 constexpr float kDelete = -1.0e-30f;
 
@@ -222,27 +228,174 @@ TEST(DataFiles, AFileMadeWithNcgenTakesSensibleDefaults) {
     xolHeaderDestroy(h);
 }
 
-TEST(DataFiles, MalformedFilesGiveACodeNeverACrash) {
+// What a failed call of the library gives: its code and its reason.
+std::string Failure(int code) {
+    return std::to_string(code) + " " + xolLastErrorText();
+}
+
+std::string OpenFailure(const std::string& path) {
+    XolHandle h = 0, f = 0;
+    const int code = xolFileRead(path, &h, &f);
+    if (code == 0) {
+        xolFileClose(f);
+        xolHeaderDestroy(h);
+    }
+    return code == 0 ? "0" : Failure(code);
+}
+
+// Writes a line file of `points` points, `steps` steps flushed one by one, as
+// far as it goes; ends the process with the code of the first failure and
+// its reason on standard error (a death test's child reads it).
+[[noreturn]] void WriteUntilItFails(const std::string& path, int points, int steps) {
+    XolHandle h = 0, f = 0;
+    xolHeaderCreate(1, "Line", "bw", 0, 1, 1, &h);
+    xolSetItemInfo(xolItemD(h, 1), 999, "Level", 0, 1);
+    xolSetItemAxisEqD1(xolItemD(h, 1), 1000, points, 0.0f, 1.0f);
+    int code = xolFileCreate(path, h, &f);
+    const std::vector<float> values(static_cast<size_t>(points), 1.0f);
+    for (int s = 0; s < steps && code == 0; ++s) {
+        code = xolWriteItemTimeStep(h, f, 0.0, values.data());
+        if (code == 0) code = xolFileFlush(f);
+    }
+    if (code == 0) code = xolFileClose(f);
+    std::fprintf(stderr, "%s\n", xolLastErrorText());
+    std::_Exit(code);
+}
+
+// A full disk for this process: files end at `bytes`, and a write beyond
+// fails instead of raising its signal.
+void LimitFileSize(rlim_t bytes) {
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit limit{bytes, bytes};
+    setrlimit(RLIMIT_FSIZE, &limit);
+}
+
+// Files that can't be read or written give the code of the failure and the
+// reason in the words of the system, of NetCDF or of this library: a file
+// missing, a folder, a text, an empty file, files cut in the mark, in the
+// header and in the last record, a header whose counts reach beyond the
+// file; a missing folder, a folder the process may not write and a full
+// disk (a limit on the size of the process's files, its signal ignored).
+TEST(DataFiles, EveryFailureGivesItsCodeAndItsReason) {
     bwtest::TempDir dir;
     const std::string good = dir / "good.xol2";
     xolHeaderDestroy(WriteGrid(good, 2));
     const std::string bytes = bwtest::ReadFile(good);
-    XolHandle h = 0, f = 0;
-    bwtest::WriteFile(dir / "text.xol2", "TARNEL_BOUSSINESQ_WAVE {\n}\n");
-    EXPECT_EQ(xolFileRead(dir / "text.xol2", &h, &f), kXolErrOpen);
-    // Cut in the mark, in the header and in the last record.
-    for (const auto& [cut, code] : {std::pair{size_t{3}, kXolErrOpen},
-                                    {size_t{40}, kXolErrFormat},
-                                    {bytes.size() - 60, kXolErrFormat}}) {
-        bwtest::WriteFile(dir / "cut.xol2", bytes.substr(0, cut));
-        EXPECT_EQ(xolFileRead(dir / "cut.xol2", &h, &f), code) << cut;
+    // The count of axes (bytes 16 to 23 of the 64-bit data format) beyond the file.
+    std::string lying = bytes;
+    lying.replace(16, 8, std::string("\0\0\0\0\x7f\xff\xff\xff", 8));
+    const std::string open = std::to_string(kXolErrOpen) + " ";
+    const std::string format = std::to_string(kXolErrFormat) + " ";
+    const struct {
+        const char* name;
+        std::string content;  // none: no file of that name
+        std::string expected;
+    } cases[] = {
+        {"absent.xol2", "", open + "no such file or directory"},
+        {"text.xol2", "TARNEL_BOUSSINESQ_WAVE {\n}\n", open + "not a data file of this engine"},
+        {"empty.xol2", "", open + "the file is empty"},
+        {"mark.xol2", bytes.substr(0, 3), open + "the file is cut short"},
+        {"header.xol2", bytes.substr(0, 40), format + "the file is cut short"},
+        {"record.xol2", bytes.substr(0, bytes.size() - 60), format + "the file is cut short"},
+        {"lying.xol2", lying,
+         format + "the header declares 2147483647 axes, more than the file holds"},
+    };
+    for (const auto& c : cases) {
+        if (c.name != std::string("absent.xol2")) bwtest::WriteFile(dir / c.name, c.content);
+        EXPECT_EQ(OpenFailure(dir / c.name), c.expected) << c.name;
     }
-    const std::string uneven =
-        Ncgen(dir, "uneven",
-              "netcdf u {\ndimensions:\n x = 3 ;\nvariables:\n float x(x) ;\n"
-              " float z(x) ;\ndata:\n x = 0, 1, 3 ;\n z = 1, 2, 3 ;\n}\n");
-    EXPECT_EQ(xolFileRead(uneven, &h, &f), kXolErrFormat);
-    EXPECT_NE(std::string(xolLastErrorText()).find("not equidistant"), std::string::npos);
+    EXPECT_EQ(OpenFailure(dir.path.string()), open + "a folder, not a file");
+
+    XolHandle h = 0, f = 0;
+    xolHeaderCreate(1, "t", "bw", 0, 1, 1, &h);
+    xolSetItemInfo(xolItemD(h, 1), 999, "a", 0, 1);
+    xolSetItemAxisEqD0(xolItemD(h, 1), 1000);
+    EXPECT_EQ(xolFileCreate(dir / "no/such/folder.xol0", h, &f), kXolErrWrite);
+    EXPECT_STREQ(xolLastErrorText(), "no such file or directory");
+    xolHeaderDestroy(h);
+    // Another user than root where the tests run as root.
+    const std::string locked = dir / "locked";
+    fs::create_directory(locked);
+    fs::permissions(locked, fs::perms::owner_read | fs::perms::owner_exec);
+    EXPECT_EXIT(
+        {
+            if (getuid() == 0 && (setgid(65534) != 0 || setuid(65534) != 0)) std::_Exit(99);
+            WriteUntilItFails(locked + "/line.xol1", 10, 1);
+        },
+        testing::ExitedWithCode(kXolErrWrite), "^permission denied");
+    EXPECT_EXIT(
+        {
+            LimitFileSize(65536);
+            WriteUntilItFails(dir / "full.xol1", 4096, 100);
+        },
+        testing::ExitedWithCode(kXolErrWrite), "^file too large");
+}
+
+// Axes that can't be used are refused at open with the reason: no finite
+// origin or spacing, a spacing of 0, a falling axis, coordinates not
+// equidistant or not finite, more points than 32 bits count (a NetCDF-4 file
+// declares them without holding them), more than four spatial axes, the time
+// axis elsewhere than first, and a header that counts more custom blocks than
+// it holds. A coordinate in 32 bits far from its origin is equidistant within
+// its rounding; a coordinate of two dimensions is no coordinate, and of an
+// attribute of several values the first counts.
+TEST(DataFiles, UnusableAxesAreRefusedAtOpen) {
+    bwtest::TempDir dir;
+    auto file = [&](const std::string& name, const std::string& dims, const std::string& vars,
+                    const std::string& data, const char* kind = "-5") {
+        const std::string cdl =
+            "netcdf f {\ndimensions:\n" + dims + "variables:\n" + vars + "data:\n" + data + "}\n";
+        bwtest::WriteFile(dir / (name + ".cdl"), cdl);
+        const auto r = bwtest::RunProgram(
+            {"/usr/bin/ncgen", kind, "-o", name + ".nc", name + ".cdl"}, dir.path.string());
+        EXPECT_EQ(r.exitCode, 0) << r.err;
+        return dir / (name + ".nc");
+    };
+    const std::string x3 = " x = 3 ;\n";
+    const std::string xz = " double x(x) ;\n float z(x) ;\n";
+    const std::string z = " z = 1, 2, 3 ;\n";
+    const std::string format = std::to_string(kXolErrFormat) + " ";
+    const std::pair<std::string, std::string> cases[] = {
+        {file("zero", x3, xz, " x = 5, 5, 5 ;\n" + z), format + "axis x has spacing 0"},
+        {file("falls", x3, xz, " x = 20, 10, 0 ;\n" + z),
+         format + "axis x falls (spacing -10): its values must rise"},
+        {file("given0", x3, xz + "  x:spacing = 0. ;\n", " x = 0, 1, 2 ;\n" + z),
+         format + "axis x has spacing 0"},
+        {file("origin", x3, xz + "  x:origin = NaN ;\n", " x = 0, 1, 2 ;\n" + z),
+         format + "axis x has an origin that is not a finite number"},
+        {file("spacing", x3, xz + "  x:spacing = Infinity ;\n", " x = 0, 1, 2 ;\n" + z),
+         format + "axis x has a spacing that is not a finite number"},
+        {file("nan", x3, xz, " x = 0, NaN, 2 ;\n" + z),
+         format + "axis x holds a value that is not a finite number"},
+        {file("uneven", x3, xz, " x = 0, 1, 3 ;\n" + z), format + "axis x is not equidistant"},
+        {file("huge", " x = 3000000000 ;\n y = 2 ;\n", " float depth(y, x) ;\n", "", "-4"),
+         format + "axis x has 3000000000 points, more than a data file may hold"},
+        {file("five", " a = 1 ;\n b = 1 ;\n c = 1 ;\n d = 1 ;\n e = 1 ;\n",
+              " float v(a, b, c, d, e) ;\n", " v = 1 ;\n"),
+         format + "item v has 5 spatial axes, more than four"},
+        {file("late", x3 + " t = UNLIMITED ;\n", " float v(x, t) ;\n", " v = {1}, {2}, {3} ;\n",
+              "-4"),
+         format + "item v has the time axis in another place than first"},
+        {file("blocks", x3, " float z(x) ;\n// global attributes:\n :custom_block_count = 9 ;\n",
+              z),
+         format + "custom_block_count is 9, but the file holds 1 attributes"},
+        {file("utm", " x = 4 ;\n", " float x(x) ;\n float z(x) ;\n",
+              " x = 500000.1, 500000.2, 500000.3, 500000.4 ;\n z = 1, 2, 3, 4 ;\n"),
+         "0"},
+        {file("aside", x3 + " n = 2 ;\n",
+              " char x(x, n) ;\n float z(x) ;\n  z:item_type = 1, 2, 3 ;\n",
+              " x = \"a\", \"b\", \"c\" ;\n" + z),
+         "0"},
+    };
+    for (const auto& [path, expected] : cases) EXPECT_EQ(OpenFailure(path), expected) << path;
+
+    XolHandle h = 0, f = 0;
+    ASSERT_EQ(xolFileRead(dir / "aside.nc", &h, &f), 0);
+    EXPECT_EQ(Describe(h),
+              "1 '' '' 0 delete -1e-30 data 0\ntime 1 unit 1400 0+1x1@0"
+              "\nitem 1 'z' 99000 1 axis 2 1000: 3,0,1");
+    xolFileClose(f);
+    xolHeaderDestroy(h);
 }
 
 }  // namespace

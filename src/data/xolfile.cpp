@@ -1,10 +1,13 @@
 #include "data/xolfile.hpp"
 
+#include <algorithm>
 #include <cerrno>
+#include <cmath>
 #include <cstdio>
 #include <cstring>
 
 #include "platform/qty/qty.hpp"
+#include "run/memory.hpp"
 #include "run/messages.hpp"
 
 namespace {
@@ -47,14 +50,34 @@ XolItem MakeItem(int32_t type, const std::string& name, int32_t unit) {
     return item;
 }
 
-// A failure: into the status when there is one, else the stop of the run.
-void Fail(XolFile& file, int code, int* status, const std::string& stopText = "") {
+// A failure: its text is the lead (by default "TRNXOL Error: ", the text of
+// the code and the file), then the reason. Into the status when there is
+// one, else the stop of the run.
+void Fail(XolFile& file, int code, int* status, const std::string& reason,
+          const std::string& lead = "") {
+    std::string text = lead;
+    if (text.empty()) {
+        text = "TRNXOL Error: " + XolErrorText(code);
+        if (!file.path.empty()) text += ": " + std::string(Trim(file.path));
+    }
+    if (!reason.empty()) text += ": " + reason;
     file.lastError = code;
+    file.lastErrorText = text;
     if (status != nullptr) {
         *status = code;
         return;
     }
-    StopRun(stopText.empty() ? "TRNXOL Error: " + XolErrorText(code) : stopText);
+    StopRun(text);
+}
+
+// The reason the data-file library gave for its last failure.
+std::string LibraryReason() {
+    return xolLastErrorText();
+}
+
+std::string ItemText(int n, const std::string& name) {
+    return (n < 0 ? "static item " + std::to_string(-n) : "item " + std::to_string(n)) + " \"" +
+           name + "\"";
 }
 
 void Succeed(int* status) {
@@ -63,31 +86,46 @@ void Succeed(int* status) {
 
 // Reads the description of an item: its entry, and its axes, which for the
 // first item set the file's and for all others must equal them exactly.
-int ReadItem(XolFile& f, XolHandle handle, int n, XolItem& item) {
-    const int dim = xolGetItemDim(handle);
-    if (n == 1)
-        f.dimension = dim;
-    else if (dim != f.dimension)
-        return kXolBadItem;
+int ReadItem(XolFile& f, XolHandle handle, int n, XolItem& item, std::string& why) {
     std::string name;
     int type = 0, unit = 0, dataType = 0;
-    if (xolGetItemInfo(handle, &type, &name, &unit, &dataType) != 0 || dataType != 1)
+    if (xolGetItemInfo(handle, &type, &name, &unit, &dataType) != 0) {
+        why = LibraryReason();
         return kXolBadItem;
+    }
+    const int dim = xolGetItemDim(handle);
+    if (n == 1) {
+        f.dimension = dim;
+    } else if (dim != f.dimension) {
+        why = ItemText(n, name) + " has " + std::to_string(dim) +
+              " spatial axes where item 1 has " + std::to_string(f.dimension);
+        return kXolBadItem;
+    }
+    if (dataType != 1) {
+        why = ItemText(n, name) + " is not of 32-bit floats";
+        return kXolBadItem;
+    }
     item.type = type;
     item.name = Cut(name, 32);
     item.unit = unit;
     item.dataType = dataType;
-    if (!BaseUnit(type, unit, item.baseUnit)) return kXolBadItem;
+    if (!BaseUnit(type, unit, item.baseUnit)) {
+        why = ItemText(n, name) + " has the type " + std::to_string(type) +
+              ", which this engine does not know";
+        return kXolBadItem;
+    }
     xolSetItemUnitConversion(handle, 3, item.baseUnit);
     item.typeText = TypeText(type);
     item.unitText = UnitText(item.baseUnit);
     const int axisType = xolGetItemAxisType(handle);
-    if (axisType != kXolAxisNone && axisType != kXolAxisEq1 && axisType != kXolAxisEq2 &&
-        axisType != kXolAxisEq3 && axisType != kXolAxisEq4)
-        return kXolBadAxis;
     int axisUnit = 0, counts[4];
     float origins[4], spacings[4];
-    if (xolGetItemAxisEq(handle, &axisUnit, counts, origins, spacings) != 0) return kXolBadAxis;
+    if ((axisType != kXolAxisNone && axisType != kXolAxisEq1 && axisType != kXolAxisEq2 &&
+         axisType != kXolAxisEq3 && axisType != kXolAxisEq4) ||
+        xolGetItemAxisEq(handle, &axisUnit, counts, origins, spacings) != 0) {
+        why = ItemText(n, name) + " has axes of an unknown kind";
+        return kXolBadAxis;
+    }
     for (int d = 0; d < dim && d < 4; ++d) {
         XolAxis axis;
         axis.count = counts[d];
@@ -99,13 +137,14 @@ int ReadItem(XolFile& f, XolHandle handle, int n, XolItem& item) {
             f.axes[d] = axis;
         } else if (f.axes[d].count != axis.count || f.axes[d].origin != axis.origin ||
                    f.axes[d].spacing != axis.spacing) {
+            why = ItemText(n, name) + " lies on other axes than item 1";
             return kXolBadAxis;
         }
     }
     return 0;
 }
 
-int OpenSteps(XolFile& f) {
+int OpenSteps(XolFile& f, std::string& why) {
     const XolHandle h = f.header;
     std::string startDate = "1970-01-01", startTime = "00:00:00";
     int unit = 0, steps = 0, startIndex = 0;
@@ -119,9 +158,14 @@ int OpenSteps(XolFile& f) {
                                     &startIndex);
         f.startDateTime = startDate + " " + startTime;
     } else {
+        why = "time axis type " + std::to_string(f.timeAxisType) +
+              " is neither relative (1) nor calendar (3)";
         return kXolBadTimeAxis;
     }
-    if (code != 0) return kXolBadTimeAxis;
+    if (code != 0) {
+        why = LibraryReason();
+        return kXolBadTimeAxis;
+    }
     f.timeUnit = unit;
     f.timeUnitText = UnitText(unit);
     f.startOffset = offset;
@@ -130,9 +174,12 @@ int OpenSteps(XolFile& f) {
     return 0;
 }
 
-int OpenItems(XolFile& f) {
+int OpenItems(XolFile& f, std::string& why) {
     const XolHandle h = f.header;
-    if (xolGetFileType(h) != 1) return kXolBadFileType;
+    if (xolGetFileType(h) != 1) {
+        why = "file type " + std::to_string(xolGetFileType(h)) + ", where this engine reads type 1";
+        return kXolBadFileType;
+    }
     f.title = Cut(xolGetFileTitle(h), 80);
     f.deleteValue = xolGetDeleteValFloat(h);
     f.dataType = xolGetDataType(h);
@@ -151,34 +198,64 @@ int OpenItems(XolFile& f) {
     if (xolGetGeoInfoType(h) == 1)
         xolGetGeoInfoUTMProj(h, &f.projection, &f.longitude, &f.latitude, &f.orientation);
     f.noDynamicItems = xolGetNoOfItems(h);
-    if (f.noDynamicItems <= 0) return kXolBadItemNumber;
+    if (f.noDynamicItems <= 0) {
+        why = "the file holds no dynamic items";
+        return kXolBadItemNumber;
+    }
     f.dynamicItems.assign(static_cast<size_t>(f.noDynamicItems), XolItem{});
-    if (int code = OpenSteps(f)) return code;
+    if (int code = OpenSteps(f, why)) return code;
 
     f.noStaticItems = 0;
     xolFindBlockStatic(f.file);
     std::vector<XolHandle> statics;
-    for (XolHandle st; (st = xolStaticRead(f.file)) != 0; ++f.noStaticItems) {
-        statics.push_back(st);
-        xolStaticDestroy(st);
-    }
+    for (XolHandle st; (st = xolStaticRead(f.file)) != 0; ++f.noStaticItems) statics.push_back(st);
     for (int n = 1; n <= f.noDynamicItems; ++n)
-        if (int code = ReadItem(f, xolItemD(h, n), n, f.dynamicItems[static_cast<size_t>(n - 1)]))
+        if (int code =
+                ReadItem(f, xolItemD(h, n), n, f.dynamicItems[static_cast<size_t>(n - 1)], why))
             return code;
     f.staticItems.assign(static_cast<size_t>(f.noStaticItems), XolItem{});
     for (int n = 1; n <= f.noStaticItems; ++n)
         if (int code = ReadItem(f, xolItemS(statics[static_cast<size_t>(n - 1)]), -n,
-                                f.staticItems[static_cast<size_t>(n - 1)]))
+                                f.staticItems[static_cast<size_t>(n - 1)], why))
             return code;
     return 0;
 }
 
+// The item of the most values must fit in the machine's memory, as every
+// reader holds a whole item at a time.
+void CheckItemMemory(XolFile& f, int* status) {
+    std::string counts;
+    for (int d = 0; d < f.dimension && d < 4; ++d)
+        counts += (d > 0 ? " x " : "") + std::to_string(f.axes[d].count);
+    const double values = static_cast<double>(XolItemValues(f));
+    const std::string what = "an item of " + counts + " points in " + std::string(Trim(f.path));
+    if (status == nullptr) {
+        CheckMemory(what, values, sizeof(float));
+        return;
+    }
+    const double need = values * sizeof(float);
+    const double have = static_cast<double>(MachineMemoryBytes());
+    if (!(need > have)) return;
+    char text[96];
+    std::snprintf(text, sizeof text, " needs %.3g GB, the machine has %.3g GB", need / 1e9,
+                  have / 1e9);
+    Fail(f, kXolNoMemory, status, "", "Unable to allocate memory: " + what + text);
+}
+
 // Defines an item in the header before the file or the static item is written.
-int DefineItem(XolFile& f, XolHandle handle, const XolItem& item) {
-    f.lastError = kXolBadItem;
+// why: the reason of a failure.
+int DefineItem(XolFile& f, XolHandle handle, const XolItem& item, std::string& why) {
     int userUnit = item.unit;
-    if (item.type != 999 && !qtyGetItemUserUnit(item.type, userUnit)) return kXolBadItem;
-    if (xolSetItemInfo(handle, item.type, item.name, userUnit, 1) != 0) return kXolBadItem;
+    if (item.type != 999 && !qtyGetItemUserUnit(item.type, userUnit)) {
+        why = "item \"" + item.name + "\" has the type " + std::to_string(item.type) +
+              ", which this engine does not know";
+        return kXolBadItem;
+    }
+    why = "item \"" + item.name + "\": ";
+    if (xolSetItemInfo(handle, item.type, item.name, userUnit, 1) != 0) {
+        why += LibraryReason();
+        return kXolBadItem;
+    }
     if (item.type != 999) xolSetItemUnitConversion(handle, 3, item.unit);
     const XolAxis* a = f.axes;
     int code = 0;
@@ -199,10 +276,14 @@ int DefineItem(XolFile& f, XolHandle handle, const XolItem& item) {
                                       a[1].spacing, a[2].spacing);
             break;
         default:
-            code = 1;
+            why += std::to_string(f.dimension) + " spatial axes, more than three";
+            return kXolBadAxis;
     }
-    if (code != 0) return kXolBadAxis;
-    f.lastError = 0;
+    if (code != 0) {
+        why += LibraryReason();
+        return kXolBadAxis;
+    }
+    why.clear();
     return 0;
 }
 
@@ -238,6 +319,8 @@ std::string XolErrorText(int code) {
             return "Unable to skip data";
         case 205:
             return "Unable to flush file";
+        case 206:
+            return "Unable to close file";
         case 301:
             return "Unable to create header";
         case 302:
@@ -261,27 +344,36 @@ XolFile XolOpenRead(const std::string& path, int* status) {
     XolFile f;
     f.appTitle = Cut(program_invocation_short_name, 40);
     f.path = path;
+    const std::string name(Trim(path));
     if (xolFileRead(path, &f.header, &f.file) != 0) {
-        Fail(f, kXolOpenFailed, status, "XOL open error on " + std::string(Trim(path)));
+        Fail(f, kXolOpenFailed, status, LibraryReason(), "XOL open error on " + name);
         return f;
     }
-    if (int code = OpenItems(f)) {
+    std::string why;
+    if (int code = OpenItems(f, why)) {
         xolFileClose(f.file);
         xolHeaderDestroy(f.header);
         f.file = f.header = 0;
-        Fail(f, code, status, XolErrorText(code) + " file: " + std::string(Trim(path)));
+        Fail(f, code, status, why, XolErrorText(code) + " file: " + name);
         return f;
     }
     f.position = f.noStaticItems > 0 ? -1 : 1;
     f.mode = 1;
+    CheckItemMemory(f, status);
+    if (f.lastError != 0) {
+        XolClose(f);
+        return f;
+    }
     Succeed(status);
     return f;
 }
 
-void XolClose(XolFile& f) {
-    xolFileClose(f.file);
+void XolClose(XolFile& f, int* status) {
+    const bool failed = f.file != 0 && xolFileClose(f.file) != 0;
+    const std::string reason = failed ? LibraryReason() : "";
     if (f.mode == 2) {
-        if (OpenSteps(f) != 0) f.lastError = kXolBadTimeAxis;
+        std::string why;
+        if (OpenSteps(f, why) != 0) f.lastError = kXolBadTimeAxis;
         for (int n = 1; n <= f.noDynamicItems; ++n) {
             XolItem& item = f.dynamicItems[static_cast<size_t>(n - 1)];
             long missing = 0;
@@ -290,17 +382,25 @@ void XolClose(XolFile& f) {
         }
     }
     xolHeaderDestroy(f.header);
+    const bool writing = f.mode == 2;
     f.file = f.header = 0;
     f.mode = 3;
+    // The last data of a file written go to disk as it closes; a failure
+    // there is reported unless an earlier one of the same file was.
+    if (failed && writing && f.lastError == 0) return Fail(f, kXolClose, status, reason);
+    Succeed(status);
 }
 
 void XolFlush(XolFile& f, int* status) {
-    if (xolFileFlush(f.file) == 0) {
-        Succeed(status);
-        return;
-    }
-    if (status == nullptr) StopRun("Flush error");
-    *status = -1;
+    if (xolFileFlush(f.file) == 0) return Succeed(status);
+    Fail(f, kXolFlush, status, LibraryReason(), "Flush error: " + std::string(Trim(f.path)));
+}
+
+size_t XolItemValues(const XolFile& f) {
+    size_t values = 1;
+    for (int d = 0; d < f.dimension && d < 4; ++d)
+        values *= static_cast<size_t>(std::max(f.axes[d].count, 1));
+    return values;
 }
 
 void XolGetTimeAxis(const XolFile& f, double& step, int32_t& steps, std::string* date,
@@ -315,7 +415,9 @@ void XolGetAxis(const XolFile& f, int axis, float& spacing, int32_t& count, floa
                 int32_t* unit, int* status) {
     if (axis < 1 || axis > f.dimension) {
         XolFile& writable = const_cast<XolFile&>(f);
-        Fail(writable, kXolBadAxis, status);
+        Fail(writable, kXolBadAxis, status,
+             "axis " + std::to_string(axis) + " asked of a file of " + std::to_string(f.dimension) +
+                 " spatial axes");
         return;
     }
     const XolAxis& a = f.axes[axis - 1];
@@ -328,32 +430,37 @@ void XolGetAxis(const XolFile& f, int axis, float& spacing, int32_t& count, floa
 
 void XolReadDynamic(XolFile& f, float* values, int* status) {
     if (f.position < 1) {
-        if (xolFindBlockDynamic(f.file) != 0) return Fail(f, kXolNoDynamicBlock, status);
+        if (xolFindBlockDynamic(f.file) != 0)
+            return Fail(f, kXolNoDynamicBlock, status, LibraryReason());
         f.position = 1;
     }
     double time = 0.0;
     if (xolReadItemTimeStep(f.header, f.file, &time, values) != 0)
-        return Fail(f, kXolDynamicRead, status);
+        return Fail(f, kXolDynamicRead, status, LibraryReason());
     ++f.position;
     Succeed(status);
 }
 
 void XolSkipDynamic(XolFile& f, int* status) {
     if (f.position < 1) {
-        if (xolFindBlockDynamic(f.file) != 0) return Fail(f, kXolNoDynamicBlock, status);
+        if (xolFindBlockDynamic(f.file) != 0)
+            return Fail(f, kXolNoDynamicBlock, status, LibraryReason());
         f.position = 1;
     }
-    if (xolSkipItem(f.header, f.file) != 0) return Fail(f, kXolSkip, status);
+    if (xolSkipItem(f.header, f.file) != 0) return Fail(f, kXolSkip, status, LibraryReason());
     ++f.position;
     Succeed(status);
 }
 
 void XolReadStatic(XolFile& f, float* values, int* status) {
-    if (f.position >= 0) return Fail(f, kXolStaticAfterDynamic, status);
+    if (f.position >= 0) return Fail(f, kXolStaticAfterDynamic, status, "");
     if (f.position == -1 && xolFindBlockStatic(f.file) != 0)
-        return Fail(f, kXolNoStaticBlock, status);
+        return Fail(f, kXolNoStaticBlock, status, LibraryReason());
     const XolHandle st = xolStaticRead(f.file);
-    if (st == 0 || xolStaticGetData(st, values) != 0) return Fail(f, kXolStaticRead, status);
+    if (st == 0)
+        return Fail(f, kXolStaticRead, status,
+                    "the file holds " + std::to_string(f.noStaticItems) + " static items");
+    if (xolStaticGetData(st, values) != 0) return Fail(f, kXolStaticRead, status, LibraryReason());
     --f.position;
     xolStaticDestroy(st);
     Succeed(status);
@@ -373,7 +480,7 @@ XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimensi
     const int fileType = options.fileTypeFlag ? 4 : 1;
     if (xolHeaderCreate(fileType, f.title, f.appTitle, f.appVersion, items, 1, &f.header) != 0) {
         f.dynamicItems.clear();
-        Fail(f, kXolCreateHeader, status);
+        Fail(f, kXolCreateHeader, status, LibraryReason());
         return f;
     }
     xolSetDeleteValFloat(f.header, f.deleteValue);
@@ -383,7 +490,10 @@ XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimensi
 
 void XolSetItem(XolFile& f, int32_t n, int32_t type, const std::string& name, int32_t unit,
                 int* status) {
-    if (n < 1 || n > f.noDynamicItems) return Fail(f, kXolBadItemNumber, status);
+    if (n < 1 || n > f.noDynamicItems)
+        return Fail(f, kXolBadItemNumber, status,
+                    "item " + std::to_string(n) + " of a file of " +
+                        std::to_string(f.noDynamicItems) + " items");
     f.dynamicItems[static_cast<size_t>(n - 1)] = MakeItem(type, name, unit);
     Succeed(status);
 }
@@ -432,14 +542,16 @@ void XolSetMisc(XolFile& f, int index, float value) {
 void XolCreateFile(XolFile& f, const std::string& path, int* status) {
     f.path = path;
     if (xolAddCustomBlock(f.header, 1, "TRN_Misc", 7, f.misc) != 0)
-        return Fail(f, kXolNoCustomBlock, status);
+        return Fail(f, kXolNoCustomBlock, status, LibraryReason());
+    std::string why;
     for (int n = 1; n <= f.noDynamicItems; ++n) {
         const int code =
-            DefineItem(f, xolItemD(f.header, n), f.dynamicItems[static_cast<size_t>(n - 1)]);
-        if (code != 0) return Fail(f, code, status, XolErrorText(code) + " for " + path);
+            DefineItem(f, xolItemD(f.header, n), f.dynamicItems[static_cast<size_t>(n - 1)], why);
+        if (code != 0) return Fail(f, code, status, why, XolErrorText(code) + " for " + path);
     }
     if (xolFileCreate(path, f.header, &f.file) != 0)
-        return Fail(f, kXolCreateFile, status, XolErrorText(kXolCreateFile) + " for " + path);
+        return Fail(f, kXolCreateFile, status, LibraryReason(),
+                    XolErrorText(kXolCreateFile) + " for " + path);
     f.position = 0;
     f.mode = 2;
     Succeed(status);
@@ -447,22 +559,23 @@ void XolCreateFile(XolFile& f, const std::string& path, int* status) {
 
 void XolWriteStatic(XolFile& f, const float* values, int32_t type, const std::string& name,
                     int32_t unit, int* status) {
-    if (f.position >= 1) return Fail(f, kXolStaticWriteAfterDynamic, status);
+    if (f.position >= 1) return Fail(f, kXolStaticWriteAfterDynamic, status, "");
     const XolHandle st = xolStaticCreate(f.header);
     const XolItem item = MakeItem(type, name, unit);
     f.staticItems.push_back(item);
     f.noStaticItems = static_cast<int32_t>(f.staticItems.size());
-    if (int code = DefineItem(f, xolItemS(st), item)) return Fail(f, code, status);
+    std::string why;
+    if (int code = DefineItem(f, xolItemS(st), item, why)) return Fail(f, code, status, why);
     const int written = xolStaticWrite(f.file, st, values);
     xolStaticDestroy(st);
-    if (written != 0) return Fail(f, kXolStaticWrite, status);
+    if (written != 0) return Fail(f, kXolStaticWrite, status, LibraryReason());
     Succeed(status);
 }
 
 void XolWriteDynamic(XolFile& f, const float* values, int* status) {
     if (f.position == 0) f.position = 1;
     if (xolWriteItemTimeStep(f.header, f.file, 0.0, values) != 0)
-        return Fail(f, kXolDynamicWrite, status);
+        return Fail(f, kXolDynamicWrite, status, LibraryReason());
     ++f.position;
     Succeed(status);
 }
@@ -508,6 +621,56 @@ void XolPrintSummary(const XolFile& f) {
     WriteLine(std::string(70, '-'));
 }
 
+// ---- values that are no numbers ------------------------------------------------
+
+void XolCheckFinite(const XolFile& f, const float* values) {
+    const size_t n = XolItemValues(f);
+    size_t i = 0;
+    while (i < n && std::isfinite(values[i])) ++i;
+    if (i == n) return;
+    // The item just read is the one before the reading position.
+    const int32_t read = std::max(f.position - 2, 0);
+    const int32_t items = std::max(f.noDynamicItems, 1);
+    const int32_t item = read % items + 1, step = read / items;
+    std::string text =
+        "XOL data holds a value that is not a finite number: " + std::string(Trim(f.path)) +
+        ", item " + std::to_string(item);
+    if (item <= static_cast<int32_t>(f.dynamicItems.size()))
+        text += " \"" + f.dynamicItems[static_cast<size_t>(item - 1)].name + "\"";
+    if (f.noTimeSteps > 1) text += ", step " + std::to_string(step);
+    if (f.dimension == 1) text += ", point " + std::to_string(i);
+    if (f.dimension >= 2) {
+        std::string place;
+        size_t rest = i;
+        for (int d = 0; d < f.dimension && d < 4; ++d) {
+            const size_t count = static_cast<size_t>(std::max(f.axes[d].count, 1));
+            place += (d > 0 ? "," : "") + std::to_string(rest % count);
+            rest /= count;
+        }
+        text += ", point (" + place + ")";
+    }
+    StopRun(text);
+}
+
+void XolCheckFiniteSteps(const std::string& path, int32_t items, int32_t first, int32_t last) {
+    XolFile f = XolOpenRead(path);
+    std::vector<float> values(XolItemValues(f));
+    last = std::min(last, f.noTimeSteps - 1);
+    first = std::max(first, 0);
+    for (int64_t m = 0; m < static_cast<int64_t>(first) * f.noDynamicItems; ++m) XolSkipDynamic(f);
+    for (int32_t s = first; s <= last; ++s) {
+        for (int32_t n = 1; n <= f.noDynamicItems; ++n) {
+            if (n > items) {
+                XolSkipDynamic(f);
+                continue;
+            }
+            XolReadDynamic(f, values.data());
+            XolCheckFinite(f, values.data());
+        }
+    }
+    XolClose(f);
+}
+
 // ---- maps on the model's grid --------------------------------------------------
 
 namespace {
@@ -522,9 +685,19 @@ void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
                   : "XOL data does not have the correct number of grid points (y.dir.)");
 }
 
+// Reads items 1 to item, so that the selected one stays in values, and checks it.
 void ReadItems(XolFile& f, int32_t item, float* values) {
     for (int32_t n = 1; n <= item; ++n) XolReadDynamic(f, values);
+    XolCheckFinite(f, values);
     XolClose(f);
+}
+
+// The stop of a map with another number of spatial axes than the reader wants.
+void CheckDimension(const XolFile& f, int wanted, const char* text, const char* kind) {
+    if (f.dimension == wanted) return;
+    StopRun(std::string(text) + ": " + std::string(Trim(f.path)) + ": it has " +
+            std::to_string(f.dimension) + " spatial axes where " + kind + " has " +
+            std::to_string(wanted));
 }
 
 }  // namespace
@@ -532,7 +705,7 @@ void ReadItems(XolFile& f, int32_t item, float* values) {
 void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
     XolFile f = XolOpenRead(path);
     XolPrintSummary(f);
-    if (f.dimension != 1) StopRun("XOL data is not 1D");
+    CheckDimension(f, 1, "XOL data is not 1D", "a map of the 1DH model");
     CheckAxis(f, 1, grid.dx, grid.J);
     ReadItems(f, item, values);
 }
@@ -540,7 +713,7 @@ void ReadGridFile1D(const std::string& path, int32_t item, float* values, const 
 void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
     XolFile f = XolOpenRead(path);
     XolPrintSummary(f);
-    if (f.dimension != 2) StopRun("ERR_XOL_NOT2D");
+    CheckDimension(f, 2, "ERR_XOL_NOT2D", "a map");
     CheckAxis(f, 1, grid.dx, grid.J);
     CheckAxis(f, 2, grid.dy, grid.K);
     ReadItems(f, item, values);

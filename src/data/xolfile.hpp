@@ -5,7 +5,9 @@
 //
 // A call with a status pointer gives 0 or the code of its failure and
 // returns; without one, a failure stops the run with "TRNXOL Error: " and the
-// text of the code.
+// text of the code, the file and the reason the data-file library gives
+// ("TRNXOL Error: Unable to read dynamic item: bed.xol2: no more data: ...").
+// Either way the record keeps that whole text in lastErrorText.
 #pragma once
 
 #include <cstdint>
@@ -63,7 +65,8 @@ struct XolFile {
     XolHandle header = 0, file = 0;
     int32_t position = kUnsetInteger;  // <0 statics ahead; 0 created; >=1 next dynamic item + 1
     int32_t lastError = 0;
-    int32_t mode = 0;  // 1 reading, 2 writing, 3 closed
+    std::string lastErrorText;  // the text of the last failure, as a stop gives it
+    int32_t mode = 0;           // 1 reading, 2 writing, 3 closed
     std::string path;
 };
 
@@ -83,6 +86,7 @@ enum XolCode {
     kXolStaticAfterDynamic = 203,
     kXolSkip = 204,
     kXolFlush = 205,
+    kXolClose = 206,
     kXolCreateHeader = 301,
     kXolCreateFile = 302,
     kXolStaticWrite = 401,
@@ -94,8 +98,13 @@ enum XolCode {
 // The text of a code; "Unknown error: N" for any other.
 std::string XolErrorText(int code);
 
+// Opens a file for reading. Besides what the data-file library refuses, a
+// file whose item needs more memory than the machine has is refused.
 XolFile XolOpenRead(const std::string& path, int* status = nullptr);
-void XolClose(XolFile& file);
+// Closes the file. A file being written that fails to close (its last data
+// could not be written) stops the run, unless an earlier failure of the same
+// file was recorded: that one is what the caller reports.
+void XolClose(XolFile& file, int* status = nullptr);
 void XolFlush(XolFile& file, int* status = nullptr);
 void XolPrintSummary(const XolFile& file);
 
@@ -106,6 +115,18 @@ void XolGetAxis(const XolFile& file, int axis, float& spacing, int32_t& count,
 void XolReadDynamic(XolFile& file, float* values, int* status = nullptr);
 void XolSkipDynamic(XolFile& file, int* status = nullptr);
 void XolReadStatic(XolFile& file, float* values, int* status = nullptr);
+// The number of values of an item: the product of the counts of the axes.
+size_t XolItemValues(const XolFile& file);
+
+// Stops the run when the dynamic item just read from the file holds a value
+// that is not a finite number (NaN or infinity; the delete value is a
+// number), naming the file, the item, the step (of a file of more than one)
+// and the first such place: point (j,k) of a map, point i along a line.
+void XolCheckFinite(const XolFile& file, const float* values);
+// The same for steps first to last of a file that is read step by step
+// during the run, so that it is refused at setup: items 1 to items of each
+// step are checked, the others passed over.
+void XolCheckFiniteSteps(const std::string& path, int32_t items, int32_t first, int32_t last);
 
 // Optional arguments of XolCreateHeader.
 struct XolHeaderOptions {
@@ -140,6 +161,8 @@ struct GridShape {
     int32_t J = 0, K = 0;
 };
 // Reads items 1 to item of a map on the model's grid into values, so that the
-// selected item is what stays; stops the run on another grid.
+// selected item is what stays; stops the run on another grid, on another
+// number of axes and on a selected item that holds a value that is not a
+// finite number.
 void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid);
 void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid);

@@ -9,6 +9,7 @@
 #include "data/xolfile.hpp"
 #include "input/kvt_access.hpp"
 #include "input/model_setup.hpp"
+#include "run/memory.hpp"
 #include "run/messages.hpp"
 #include "solver2d/model_state.hpp"
 
@@ -16,13 +17,26 @@ namespace {
 
 constexpr int32_t kHotStartDataType = 11;
 
-// The file must open as a data file before the layer reads its record.
+// The file must open as a data file before the layer reads its record; the
+// stop names the file and the reason.
 void CheckOpens(const std::string& path) {
+    const std::string stop = "XOL file can not be opened: " + std::string(Trim(path)) + ": ";
     XolHandle header = 0, file = 0;
-    if (xolFileRead(path, &header, &file) != 0 || xolGetNoOfItems(header) < 1)
-        StopRun("XOL file can not be opened");
+    if (xolFileRead(path, &header, &file) != 0) StopRun(stop + xolLastErrorText());
+    const bool items = xolGetNoOfItems(header) >= 1;
     xolFileClose(file);
     xolHeaderDestroy(header);
+    if (!items) StopRun(stop + "the file holds no dynamic items");
+}
+
+// A bathymetry of the 2DH model has two spatial axes, one of the 1DH model one.
+void CheckAxes(const XolFile& f, bool twoD) {
+    const int32_t wanted = twoD ? 2 : 1;
+    if (f.dimension == wanted) return;
+    StopRun(std::string(twoD ? "XOL data is not 2D: " : "XOL data is not 1D: ") +
+            std::string(Trim(f.path)) + ": it has " + std::to_string(f.dimension) +
+            " spatial axes where a bathymetry" + (twoD ? "" : " of the 1DH model") + " has " +
+            std::to_string(wanted));
 }
 
 // The map frame of the grid and the geographical position of its origin.
@@ -35,13 +49,6 @@ void OpenGridFrame(const XolFile& f) {
     if (status != 0) StopRun("Unable to initialize the cartography module");
     g.longitude = longitude;
     g.latitude = latitude;
-}
-
-size_t ItemSize(const XolFile& f) {
-    size_t size = 1;
-    for (int d = 0; d < f.dimension && d < 4; ++d)
-        size *= static_cast<size_t>(std::max(f.axes[d].count, 1));
-    return size;
 }
 
 }  // namespace
@@ -64,6 +71,7 @@ void ReadBathymetry(KvtHandle target) {
 
     GridState& g = gGrid;
     const bool twoD = gBasic.numberOfDimensions == 2;
+    CheckAxes(f, twoD);
     if (twoD) {
         g.projection = std::string(TrimRight(f.projection));
         g.orientation = static_cast<float>(f.orientation);
@@ -80,16 +88,20 @@ void ReadBathymetry(KvtHandle target) {
         OpenGridFrame(f);
     }
 
+    // The bed and the room to read an item into, which with one dimension
+    // may be more than the model's line: read the whole item, keep the line.
+    const size_t room = std::max(XolItemValues(f), g.Points());
+    CheckMemory("the bathymetry of " + std::to_string(g.J + 1) + " x " + std::to_string(g.K + 1) +
+                    " points in " + std::string(Trim(b.fileName)),
+                static_cast<double>(g.Points() + room), sizeof(float));
     try {
         g.bed.assign(g.Points(), 0.0f);
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
-    // An item fills the file's whole grid, which with one dimension may be
-    // more than the model's line: read into room for it, keep the line.
     std::vector<float> item;
     try {
-        item.assign(std::max(ItemSize(f), g.Points()), 0.0f);
+        item.assign(room, 0.0f);
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
@@ -97,11 +109,15 @@ void ReadBathymetry(KvtHandle target) {
         // Items 1 to the selected one, so that the selected item stays.
         for (int32_t n = 1; n <= b.itemNumbers[0]; ++n) XolReadDynamic(f, item.data());
     } else {
-        if (f.dataType != kHotStartDataType) StopRun("XOL data is not hot start data");
+        if (f.dataType != kHotStartDataType)
+            StopRun("XOL data is not hot start data: " + std::string(Trim(b.fileName)) +
+                    ": its data type is " + std::to_string(f.dataType) +
+                    " where a state file has " + std::to_string(kHotStartDataType));
         // The scalars of the state file, then the bed over them.
         XolReadDynamic(f, item.data());
         XolReadDynamic(f, item.data());
     }
+    XolCheckFinite(f, item.data());
     XolClose(f);
     std::copy(item.begin(), item.begin() + static_cast<ptrdiff_t>(g.Points()), g.bed.begin());
 }

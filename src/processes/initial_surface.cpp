@@ -40,7 +40,8 @@ void ColdStart(KvtHandle target) {
 }
 
 // xiPrev2 is not in the file: it keeps the value of the allocation until
-// the first shift of step 1.
+// the first shift of step 1. A value that is no finite number stops the run
+// at the item that holds it.
 void HotStart() {
     GridState& g = gGrid;
     RollerSettings& r = gRollers;
@@ -61,7 +62,10 @@ void HotStart() {
                               rollers ? r.delta.data() : work,
                               rollers ? r.cx.data() : work,
                               rollers ? r.cy.data() : work};
-    for (float* values : items) XolReadDynamic(f, values);
+    for (float* values : items) {
+        XolReadDynamic(f, values);
+        XolCheckFinite(f, values);
+    }
     XolClose(f);
     CalculateDepth(g.J, g.K, g.depth.data(), g.bed.data(), g.xi.data());
 }

@@ -92,6 +92,16 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
         (records > 1 && l.fileStep <= 0.0))
         StopRun("XOL data does not cover the simulation period");
     l.records = records;
+    // The records the run will read, checked whole now: the first two from
+    // the whole file steps before the start, to the one that reaches the end
+    // of the run (and one more, which the rounding of the last time may ask for).
+    const int32_t before =
+        l.fileStep > 0.0 ? std::max(static_cast<int32_t>(std::floor(-fileStart / l.fileStep)), 0)
+                         : 0;
+    const double reach = l.fileStep > 0.0 ? std::ceil((runEnd - fileStart) / l.fileStep + 1e-6) : 0;
+    const int32_t last =
+        static_cast<int32_t>(std::clamp<double>(reach, before + 1.0, records - 1.0));
+    XolCheckFiniteSteps(r.fileName, gEquation.deepWaterTerms ? 2 : 1, before, last);
 
     const size_t points = static_cast<size_t>(r.pointCount) + 1;
     try {
@@ -107,9 +117,6 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
     // The whole file steps before the start are passed over; the last of
     // them is the older record, the next the newer one. A file that starts
     // within the tolerance after the start passes nothing over.
-    const int32_t before =
-        l.fileStep > 0.0 ? std::max(static_cast<int32_t>(std::floor(-fileStart / l.fileStep)), 0)
-                         : 0;
     for (int32_t m = 0; m < before; ++m) {
         XolSkipDynamic(f);
         XolSkipDynamic(f);
@@ -250,6 +257,7 @@ void ReadHotStartSources() {
     for (int32_t item = 1; item <= kHotStartItems; ++item) {
         XolReadDynamic(f, work.data());
         if (item < 15) continue;
+        XolCheckFinite(f, work.data());
         std::vector<float>& v = *targets[item - 15];
         std::copy(work.begin(), work.begin() + s.sourceCount, v.begin() + 1);
     }

@@ -211,7 +211,15 @@ void OpenBoundaryLineFile(const BoundaryRecord& r, int32_t rows, BoundaryLineFil
     }
     double w = 0.0;
     const int32_t before = RecordBefore(t, 0.0, w);
-    for (int32_t m = 0; m < before * items; ++m) XolSkipDynamic(l.file);
+    // The records the run will read, checked whole now: from the one before
+    // the start to the one that reaches the end of the run (and one more,
+    // which the rounding of the last time may ask for).
+    const double runEnd = gGrid.timeStepCount * gGrid.dt;
+    const double reach = std::ceil((runEnd - t.start) / t.step + 1e-6);
+    const int32_t last =
+        static_cast<int32_t>(std::clamp<double>(reach, before + 1.0, t.records - 1.0));
+    XolCheckFiniteSteps(r.fileName, items, before, last);
+    for (int64_t m = 0; m < static_cast<int64_t>(before) * items; ++m) XolSkipDynamic(l.file);
     ReadLineRecord(l, l.older, rows);
     ReadLineRecord(l, l.newer, rows);
     l.recordsRead = before + 2;
@@ -271,10 +279,14 @@ void ReadTimeSeries0D(const std::string& path, int32_t count, const int32_t* ite
     } catch (const std::bad_alloc&) {
         StopRun("Unable to allocate memory");
     }
-    for (int32_t m = 0; m < firstNeeded * itemsInFile; ++m) XolSkipDynamic(f);
-    for (int32_t m = firstNeeded; m <= lastNeeded; ++m)
-        for (int32_t i = 0; i < itemsInFile; ++i)
-            XolReadDynamic(f, &records[static_cast<size_t>(m - firstNeeded) * itemsInFile + i]);
+    for (int64_t m = 0; m < static_cast<int64_t>(firstNeeded) * itemsInFile; ++m) XolSkipDynamic(f);
+    for (int32_t m = firstNeeded; m <= lastNeeded; ++m) {
+        for (int32_t i = 0; i < itemsInFile; ++i) {
+            float* value = &records[static_cast<size_t>(m - firstNeeded) * itemsInFile + i];
+            XolReadDynamic(f, value);
+            if (std::find(items, items + count, i + 1) != items + count) XolCheckFinite(f, value);
+        }
+    }
     XolClose(f);
 
     auto value = [&](int32_t m, int32_t item) {

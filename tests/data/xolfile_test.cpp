@@ -1,13 +1,20 @@
 #include "data/xolfile.hpp"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <unistd.h>
 
 #include <cmath>
+#include <csignal>
 #include <cstdlib>
+#include <filesystem>
+#include <limits>
 #include <tuple>
 #include <vector>
 
+#include "run/messages.hpp"
 #include "support/log_capture.hpp"
+#include "support/model_builder.hpp"
 
 namespace {
 
@@ -116,12 +123,23 @@ TEST(DataFileLayer, FailuresGiveTheirCodesOrStop) {
                 .exitCode,
             0);
     }
-    for (const auto& [name, code] : {std::pair{"shifted.xol1", kXolBadAxis},
-                                     {"type4.xol0", kXolBadFileType},
-                                     {"e.nc", kXolBadItemNumber},
-                                     {"c.nc", kXolBadTimeAxis}}) {
-        XolOpenRead(dir / name, &status);
-        EXPECT_EQ(status, code) << name;
+    const struct {
+        const char* name;
+        int code;
+        const char* text;
+    } opens[] = {
+        {"shifted.xol1", kXolBadAxis,
+         "Invalid spatial axis file: %: item 2 \"b\" lies on other axes than item 1"},
+        {"type4.xol0", kXolBadFileType,
+         "Invalid type of XOL file file: %: file type 4, where this engine reads type 1"},
+        {"e.nc", kXolBadItemNumber, "Invalid item number file: %: the file holds no dynamic items"},
+        {"c.nc", kXolBadTimeAxis,
+         "Invalid time axis file: %: time axis type 2 is neither relative (1) nor calendar (3)"},
+    };
+    for (const auto& c : opens) {
+        const XolFile opened = XolOpenRead(dir / c.name, &status);
+        EXPECT_EQ(status, c.code) << c.name;
+        EXPECT_EQ(opened.lastErrorText, Filled(c.text, dir / c.name));
     }
 
     setenv("TRF", "HUD", 1);  // stop texts go to standard error, where the death test reads them
@@ -139,6 +157,135 @@ TEST(DataFileLayer, FailuresGiveTheirCodesOrStop) {
                 testing::ExitedWithCode(1), "correct grid spacing \\(x-dir.\\)");
     EXPECT_EXIT(ReadGridFile2D(path, 1, values.data(), {2.0f, 3.0f, 3, 3}),
                 testing::ExitedWithCode(1), "correct number of grid points \\(y.dir.\\)");
+    unsetenv("TRF");
+}
+
+// A full disk for this process: files end at `bytes`, and a write beyond
+// fails instead of raising its signal.
+void LimitFileSize(rlim_t bytes) {
+    if (bytes == RLIM_INFINITY) return;
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit limit{bytes, bytes};
+    setrlimit(RLIMIT_FSIZE, &limit);
+}
+
+// A line file of 1024 points written step by step with the stop forms
+// (flushed after each step when flush is set) on a disk that holds `bytes`.
+void FillTheDisk(const std::string& path, int steps, bool flush, rlim_t bytes) {
+    LimitFileSize(bytes);
+    XolFile f = XolCreateHeader("Line", 1, 1);
+    XolSetItem(f, 1, 100078, "Level", 1000);
+    XolSetAxis(f, 1, 1.0f, 0.0f, 1024);
+    XolSetCalendarAxis(f, 1.0, "2004-01-01 00:00:00");
+    XolCreateFile(f, path);
+    const std::vector<float> values(1024, 1.0f);
+    for (int s = 0; s < steps; ++s) {
+        XolWriteDynamic(f, values.data());
+        if (flush) XolFlush(f);
+    }
+    XolClose(f);
+}
+
+// A stop that comes from a data file keeps its first words, then names the
+// file and the reason: a file missing, read past its end, too large for the
+// machine's memory (a NetCDF-4 file declares it without holding it), created
+// in a missing folder, and a disk that fills up under a write, a flush or
+// the close. The status forms give the same text in the record, and stop
+// nothing.
+TEST(DataFileLayer, StopsNameTheFileAndTheReason) {
+    bwtest::TempDir dir;
+    setenv("TRF", "HUD", 1);  // stop texts go to standard error, where the death test reads them
+    const std::string one = dir / "one.xol0";
+    bwtest::WriteSeriesFile(one, "2004-01-01 00:00:00", 1.0, {{1.0f}});
+    bwtest::WriteFile(dir / "huge.cdl",
+                      "netcdf h {\ndimensions:\n x = 1000000000 ;\n y = 1000000000 ;\n"
+                      "variables:\n float z(y, x) ;\n}\n");
+    ASSERT_EQ(
+        bwtest::RunProgram({"/usr/bin/ncgen", "-4", "-o", "huge.nc", "huge.cdl"}, dir.path.string())
+            .exitCode,
+        0);
+    const std::string huge =
+        "Unable to allocate memory: an item of 1000000000 x 1000000000 points "
+        "in " +
+        dir / "huge.nc" + " needs 4e\\+09 GB, the machine has";
+    int status = 0;
+    XolFile f = XolOpenRead(dir / "huge.nc", &status);
+    EXPECT_EQ(status, kXolNoMemory);
+    EXPECT_TRUE(testing::internal::RE::PartialMatch(f.lastErrorText, huge)) << f.lastErrorText;
+    f = XolOpenRead(dir / "absent.xol2", &status);
+    EXPECT_EQ(f.lastErrorText,
+              "XOL open error on " + dir / "absent.xol2" + ": no such file or directory");
+
+    EXPECT_EXIT(XolOpenRead(dir / "absent.xol2"), testing::ExitedWithCode(1),
+                "XOL open error on .*absent.xol2: no such file or directory\n");
+    EXPECT_EXIT(XolOpenRead(dir / "huge.nc"), testing::ExitedWithCode(1), huge);
+    EXPECT_EXIT(
+        {
+            XolFile series = XolOpenRead(one);
+            float v = 0.0f;
+            XolReadDynamic(series, &v);
+            XolReadDynamic(series, &v);
+        },
+        testing::ExitedWithCode(1),
+        "TRNXOL Error: Unable to read dynamic item: .*one.xol0: no more data: the file holds 1 "
+        "step of 1 item\n");
+    EXPECT_EXIT(
+        {
+            XolFile made = XolCreateHeader("t", 1, 0);
+            XolSetItem(made, 1, 999, "a", 0);
+            XolCreateFile(made, dir / "no/folder.xol0");
+        },
+        testing::ExitedWithCode(1),
+        "Unable to create file for .*no/folder.xol0: no such file or directory\n");
+    EXPECT_EXIT(FillTheDisk(dir / "flushed.xol1", 8, true, 40000), testing::ExitedWithCode(1),
+                "Flush error: .*flushed.xol1: file too large\n");
+    EXPECT_EXIT(FillTheDisk(dir / "written.xol1", 8, false, 40000), testing::ExitedWithCode(1),
+                "TRNXOL Error: Unable to write dynamic item: .*written.xol1: file too large\n");
+    // The step of a file written without a flush goes to disk as it closes.
+    FillTheDisk(dir / "whole.xol1", 1, false, RLIM_INFINITY);
+    const rlim_t whole = std::filesystem::file_size(dir / "whole.xol1");
+    EXPECT_EXIT(FillTheDisk(dir / "closed.xol1", 1, false, whole - 1024),
+                testing::ExitedWithCode(1),
+                "TRNXOL Error: Unable to close file: .*closed.xol1: file too large\n");
+    unsetenv("TRF");
+}
+
+// A value that is not a finite number stops the reading of a map at its
+// place (j,k), and of a line file checked at setup at its step and point;
+// the delete value, huge values and items the reader does not want pass.
+TEST(DataFileLayer, ValuesThatAreNoNumbersStopNamingTheirPlace) {
+    bwtest::TempDir dir;
+    setenv("TRF", "HUD", 1);
+    const float nan = std::numeric_limits<float>::quiet_NaN();
+    const float inf = std::numeric_limits<float>::infinity();
+    bwtest::MapSpec grid;
+    grid.J = 3, grid.K = 2;
+    std::vector<float> map = bwtest::Constant(grid, 3.0e38f);
+    map[1] = kDeleteValue;
+    bwtest::WriteMapFile(dir / "good.xol2", grid, map);
+    map[1 * 4 + 3] = -inf;
+    bwtest::WriteMapFile(dir / "bad.xol2", grid, map);
+    std::vector<float> values(12);
+    ReadGridFile2D(dir / "good.xol2", 1, values.data(), {1.0f, 1.0f, 3, 2});
+    EXPECT_EQ(values[1], kDeleteValue);
+    EXPECT_EXIT(ReadGridFile2D(dir / "bad.xol2", 1, values.data(), {1.0f, 1.0f, 3, 2}),
+                testing::ExitedWithCode(1),
+                "XOL data holds a value that is not a finite number: .*bad.xol2, item 1 "
+                "\"Bathymetry\", point \\(3,1\\)\n");
+
+    // Three steps of three points; item 2 (not checked) holds a NaN from the start.
+    std::vector<std::vector<std::vector<float>>> line(
+        2, std::vector<std::vector<float>>(3, std::vector<float>(3, 1.0f)));
+    line[1][0][0] = nan;
+    line[0][2][1] = inf;
+    bwtest::WriteLineFile(dir / "line.xol1", "2004-01-01 00:00:00", 1.0, 1.0f, line, 0,
+                          {"Level", "Deep"});
+    XolCheckFiniteSteps(dir / "line.xol1", 1, 0, 1);
+    EXPECT_EXIT(XolCheckFiniteSteps(dir / "line.xol1", 1, 1, 2), testing::ExitedWithCode(1),
+                "XOL data holds a value that is not a finite number: .*line.xol1, item 1 "
+                "\"Level\", step 2, point 1\n");
+    EXPECT_EXIT(XolCheckFiniteSteps(dir / "line.xol1", 2, 0, 0), testing::ExitedWithCode(1),
+                "line.xol1, item 2 \"Deep\", step 0, point 0\n");
     unsetenv("TRF");
 }
 

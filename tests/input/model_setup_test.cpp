@@ -3,6 +3,9 @@
 // log records every setting, defaults marked.
 #include <gtest/gtest.h>
 
+#include <limits>
+
+#include "data/xolfile.hpp"
 #include "support/model_builder.hpp"
 #include "support/test_support.hpp"
 
@@ -84,10 +87,14 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
         "Last_Line_Pos = 2, 4\nWave_Type = 0\n" +
         bwtest::DataFileSection("gen.xol0") + "}\n";
     const std::string deep = "Deep_Water_Terms = true\nDispersion_Factor = ";
+    // The bathymetry of the 1DH model lies along one axis.
+    bwtest::WriteLineFile(dir / "line.xol1", "2004-01-01 00:00:00", 1.0, 1.0f,
+                          {{{1.0f, -2.0f, -2.0f, -2.0f, 1.0f}}});
     const struct {
         Sections sections;
         const char* message;
         std::vector<const char*> inLog = {};
+        std::string bathymetry = "bed.xol2";
     } cases[] = {
         {{{"Sponge", "-"}}, "KVT section: Sponge not found"},
         {{{"Sponge", "Sponge_Type = true\n"}}, "KVT section: DATA_FILE not found"},
@@ -114,15 +121,56 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
         {{{"Internal_Generation", generation}, {"Equation_Parameters", deep + "0.0667\n"}},
          "SetupInternalGeneration: the deep water terms need two items in the series"},
         {{{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}},
-         "The 1DH mesh solver is not yet available in this version"},
+         "The 1DH mesh solver is not yet available in this version",
+         {},
+         "line.xol1"},
     };
     for (const auto& c : cases) {
-        const bwtest::RunResult r = Run(c.sections);
+        const bwtest::RunResult r = Run(c.sections, c.bathymetry);
         EXPECT_EQ(r.exitCode, 1) << c.message;
         EXPECT_EQ(r.out, std::string(c.message) + "\n");
         const std::string log = bwtest::ReadFile(dir / "m.log");
         EXPECT_NE(log.find("Abnormal completion"), std::string::npos) << c.message;
         for (const char* text : c.inLog) EXPECT_NE(log.find(text), std::string::npos) << text;
+    }
+}
+
+// A bathymetry the engine can't use stops the run with the file and the
+// reason: not a data file, on a third spatial axis, with a bed that holds a
+// value that is no number (its place named), and for the 1DH model on two
+// axes.
+TEST_F(ModelFile, ABathymetryThatCanNotBeUsedStopsNamingTheFileAndTheReason) {
+    bwtest::WriteFile(dir / "text.xol2", "TARNEL_BOUSSINESQ_WAVE {\n}\n");
+    std::vector<float> bed = bwtest::Constant(grid, -2.0f);
+    bed[4 * (grid.J + 1) + 3] = std::numeric_limits<float>::quiet_NaN();
+    bwtest::WriteMapFile(dir / "nan.xol2", grid, bed);
+    XolFile f = XolCreateHeader("Cube", 1, 3);
+    XolSetItem(f, 1, 100079, "Bathymetry", 1000);
+    for (int axis = 1; axis <= 3; ++axis) XolSetAxis(f, axis, 1.0f, 0.0f, 3);
+    XolSetCalendarAxis(f, 1.0, "2004-01-01 00:00:00");
+    XolSetProjection(f, "NON-UTM", 0.0, 0.0);
+    XolCreateFile(f, dir / "cube.xol3");
+    XolWriteDynamic(f, std::vector<float>(27, -1.0f).data());
+    XolClose(f);
+    const struct {
+        std::string bathymetry, message;
+        Sections sections = {};
+    } cases[] = {
+        {"text.xol2", "XOL file can not be opened: %: not a data file of this engine"},
+        {"cube.xol3", "XOL data is not 2D: %: it has 3 spatial axes where a bathymetry has 2"},
+        {"nan.xol2",
+         "XOL data holds a value that is not a finite number: %, item 1 \"Bathymetry\", "
+         "point (3,4)"},
+        {"bed.xol2",
+         "XOL data is not 1D: %: it has 2 spatial axes where a bathymetry of the 1DH model has 1",
+         {{"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\n"}}},
+    };
+    for (const auto& c : cases) {
+        const bwtest::RunResult r = Run(c.sections, c.bathymetry);
+        EXPECT_EQ(r.exitCode, 1) << c.bathymetry;
+        std::string message = c.message;
+        message.replace(message.find('%'), 1, dir / c.bathymetry);
+        EXPECT_EQ(r.out, message + "\n");
     }
 }
 

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <limits>
 
 #include "data/tsfunc.hpp"
 #include "input/model_setup.hpp"
@@ -114,6 +115,35 @@ TEST_F(Generation, WrongLineFilesStopTheRunAndOneThatReachesTheLastStepIsTaken) 
     gGrid.dt = 0.1, gGrid.timeStepCount = 33;
     Setup({{10, 5, 10, 8, 4}}, "2004-01-01 00:00:00", 0.3, 12);
     EXPECT_EQ(gGeneration.lineFiles[0].records, 12);
+}
+
+// A value that is not a finite number in a line file stops the setup with
+// the file, the item, the step and the point, at any record the run will
+// read; item 2 is read only with the deep water terms, and records after the
+// end of the run may hold anything.
+TEST_F(Generation, ValuesThatAreNoNumbersInALineFileStopTheSetup) {
+    const float nan = std::numeric_limits<float>::quiet_NaN();
+    // Ten records of 1 s for 10 steps of 0.5 s: records 0 to 5 are read.
+    auto write = [&](const std::string& name, int item, int record) {
+        std::vector<std::vector<std::vector<float>>> v(
+            2, std::vector<std::vector<float>>(10, std::vector<float>(4, 1.0f)));
+        v[item][record][3] = nan;
+        bwtest::WriteLineFile(dir / name, "2004-01-01 00:00:00", 1.0, 1.0f, v);
+        SetupText(bwtest::GenerationRecord(1, 10, 5, 10, 8, 1, name), 1);
+    };
+    setenv("TRF", "HUD", 1);
+    EXPECT_EXIT(write("main.xol1", 0, 5), testing::ExitedWithCode(1),
+                "XOL data holds a value that is not a finite number: .*main.xol1, item 1 \"Item "
+                "1\", step 5, point 3\n");
+    gEquation.deepWaterTerms = true;
+    EXPECT_EXIT(write("deep.xol1", 1, 0), testing::ExitedWithCode(1),
+                "deep.xol1, item 2 \"Item 2\", step 0, point 3\n");
+    gEquation.deepWaterTerms = false;
+    unsetenv("TRF");
+    write("deep.xol1", 1, 0);
+    bwtest::ClearGeneration();
+    write("after.xol1", 0, 8);
+    EXPECT_EQ(gGeneration.lineFiles[0].newer, std::vector<float>(4, 1.0f));
 }
 
 TEST_F(Generation, TheUpdateFeedsEachKindOfLineAtTheMiddleAndTheEndOfTheStep) {

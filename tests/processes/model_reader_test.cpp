@@ -4,6 +4,7 @@
 
 #include <cmath>
 #include <cstdlib>
+#include <limits>
 
 #include "data/tsfunc.hpp"
 #include "data/xolfile.hpp"
@@ -31,9 +32,10 @@ std::vector<float> Bed() {
     return bed;
 }
 
-// A map file of several items, item n holding base + n at every point.
+// A map file of several items, item n holding base + n at every point; the
+// item `bad`, if any, holds `value` at (5,0).
 void WriteItems(const std::string& path, const bwtest::MapSpec& grid, int items, float base,
-                int dataType = 0) {
+                int dataType = 0, int bad = 0, float value = 0.0f) {
     XolFile f = XolCreateHeader("Test map", items, 2);
     for (int n = 1; n <= items; ++n) XolSetItem(f, n, 100079, "Item " + std::to_string(n), 1000);
     XolSetAxis(f, 1, grid.dx, 0.0f, grid.J + 1);
@@ -46,6 +48,7 @@ void WriteItems(const std::string& path, const bwtest::MapSpec& grid, int items,
     for (int n = 1; n <= items; ++n) {
         std::fill(v.begin(), v.end(), base + n);
         if (n == 2 && dataType == 11) v = Bed();  // a state file holds the bed as item 2
+        if (n == bad) v[5] = value;
         XolWriteDynamic(f, v.data());
     }
     XolClose(f);
@@ -169,10 +172,13 @@ TEST_F(ModelReader, AHotStartReadsTheStateAndNeedsNoSurfaceSection) {
 using ModelReaderDeathTest = ModelReader;
 
 TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
-    bwtest::MapSpec bare = grid, bogus = grid, wide = grid;
+    bwtest::MapSpec bare = grid, bogus = grid, wide = grid, flat = grid, falling = grid;
     bare.projection = "", bogus.projection = "NO-SUCH-FRAME", wide.J = 7;
+    flat.dx = 0.0f, falling.dy = -3.0f;
     bwtest::WriteMapFile(dir / "bare.xol2", bare, Bed());
     bwtest::WriteMapFile(dir / "bogus.xol2", bogus, Bed());
+    bwtest::WriteMapFile(dir / "flat.xol2", flat, Bed());
+    bwtest::WriteMapFile(dir / "falling.xol2", falling, Bed());
     bwtest::WriteMapFile(dir / "wide.xol2", wide, bwtest::Constant(wide, 1.0f));
     bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0, {{0.0f, 1.0f}});
     auto with = [](const char* section, const char* type, const char* file) {
@@ -184,15 +190,76 @@ TEST_F(ModelReaderDeathTest, BadFilesStopWithTheirMessage) {
     } cases[] = {
         {with("Bathymetry_Selection", "Hot_Start", "bed.xol2"), "bed.xol2",
          "XOL data is not hot start data"},
-        {{}, "absent.xol2", "XOL file can not be opened"},
+        {{}, "absent.xol2", "XOL file can not be opened: .*absent.xol2: no such file or directory"},
+        {{}, "flat.xol2", "XOL file can not be opened: .*flat.xol2: axis x has spacing 0"},
+        {{},
+         "falling.xol2",
+         "XOL file can not be opened: .*falling.xol2: axis y falls \\(spacing -3\\): its values "
+         "must rise"},
         {{}, "bare.xol2", "XOL data does not contain projection information"},
         {{}, "bogus.xol2", "Unable to initialize the cartography module"},
-        {with("Sponge", "Sponge_Type", "series.xol0"), "bed.xol2", "ERR_XOL_NOT2D"},
+        {with("Sponge", "Sponge_Type", "series.xol0"), "bed.xol2",
+         "ERR_XOL_NOT2D: .*series.xol0: it has 0 spatial axes where a map has 2"},
         {with("Sponge", "Sponge_Type", "wide.xol2"), "bed.xol2",
          "XOL data does not have the correct number of grid points \\(x.dir.\\)"},
     };
     for (const auto& c : cases)
         EXPECT_EXIT(Read(c.sections, c.bathymetry), testing::ExitedWithCode(1), c.message);
+}
+
+// A value that is not a finite number in a file the setup reads stops it
+// with the file, the item and the place: in the bed (also the bed of a state
+// file), in a map (every reader of maps reads through the same routine) and
+// in the items of a state file that the surface and the generation read.
+TEST_F(ModelReaderDeathTest, ValuesThatAreNoNumbersStopNamingFileItemAndPlace) {
+    const float nan = std::numeric_limits<float>::quiet_NaN();
+    const float inf = std::numeric_limits<float>::infinity();
+    std::vector<float> bed = Bed(), map = bwtest::Constant(grid, 0.5f);
+    bed[3 * 7 + 2] = nan;
+    map[2 * 7 + 1] = -inf;
+    bwtest::WriteMapFile(dir / "nan.xol2", grid, bed);
+    bwtest::MapSpec named = grid;
+    named.itemName = "Coefficient";
+    bwtest::WriteMapFile(dir / "map.xol2", named, map);
+    WriteItems(dir / "hot6.xol2", grid, 18, 100.0f, 11, 6, inf);
+    WriteItems(dir / "hot2.xol2", grid, 18, 100.0f, 11, 2, nan);
+    WriteItems(dir / "hot16.xol2", grid, 18, 100.0f, 11, 16, nan);
+    const std::string map2 = "map.xol2, item 1 \"Coefficient\", point \\(1,2\\)";
+    const std::string hot = "Hot_Start = true\n";
+    const std::string generation =
+        "Number_Of_Records = 1\n" + bwtest::GenerationRecord(1, 1, 1, 1, 2, 0, "series.xol0");
+    bwtest::WriteSeriesFile(dir / "series.xol0", "2004-01-01 00:00:00", 1.0,
+                            {std::vector<float>(4, 0.0f), std::vector<float>(4, 0.0f)});
+    const struct {
+        Sections sections;
+        const char *bathymetry, *message;
+    } cases[] = {
+        {{}, "nan.xol2", "nan.xol2, item 1 \"Bathymetry\", point \\(2,3\\)"},
+        {{{"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("map.xol2")}},
+         "bed.xol2",
+         map2.c_str()},
+        {{{"Porosity", "Porosity_Type = true\n" + bwtest::DataFileSection("map.xol2")}},
+         "bed.xol2",
+         map2.c_str()},
+        {{{"Bathymetry_Selection", hot + bwtest::DataFileSection("hot2.xol2")},
+          {"SURFACE_ELEVATION", "-"}},
+         "hot2.xol2",
+         "hot2.xol2, item 2 \"Item 2\", point \\(5,0\\)"},
+        {{{"Bathymetry_Selection", hot + bwtest::DataFileSection("hot6.xol2")},
+          {"SURFACE_ELEVATION", "-"}},
+         "hot6.xol2",
+         "hot6.xol2, item 6 \"Item 6\", point \\(5,0\\)"},
+        {{{"Bathymetry_Selection", hot + bwtest::DataFileSection("hot16.xol2")},
+          {"SURFACE_ELEVATION", "-"},
+          {"Internal_Generation", generation}},
+         "hot16.xol2",
+         "hot16.xol2, item 16 \"Item 16\", point \\(5,0\\)"},
+    };
+    for (const auto& c : cases)
+        EXPECT_EXIT(Read(c.sections, c.bathymetry), testing::ExitedWithCode(1),
+                    std::string("XOL data holds a value that is not a finite number: .*") +
+                        c.message + "\n")
+            << c.message;
 }
 
 }  // namespace

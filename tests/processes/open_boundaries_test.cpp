@@ -7,6 +7,7 @@
 
 #include <cmath>
 #include <cstdlib>
+#include <limits>
 #include <sstream>
 
 #include "data/tsfunc.hpp"
@@ -242,6 +243,34 @@ TEST_F(BoundariesDeathTest, LinesSettingsAndFilesThatDoNotFitStop) {
     Setup({{0, 1, 0, 5, 0, 0, "exact.xol0"}});
     Steps(1, 20);
     EXPECT_FLOAT_EQ(BoundaryValues(1).Value(0, 1), 1.0f);
+}
+
+// A value that is not a finite number stops the setup with the file, the
+// item, the step and the point: in the series where the run reads it, and in
+// a line file at any record up to the end of the run, though it would only be
+// read then; a record the run does not need may hold anything.
+TEST_F(BoundariesDeathTest, ValuesThatAreNoNumbersStopTheSetupWhereverTheRunReadsThem) {
+    const float nan = std::numeric_limits<float>::quiet_NaN();
+    std::vector<float> level(5, 1.0f);
+    level[3] = nan;
+    bwtest::WriteSeriesFile(dir / "nan.xol0", kStart, 0.5, {level});
+    // Records every 0.5 s up to 4.5 s, for a run of 2 s: the last needed is at 2 s.
+    std::vector<std::vector<std::vector<float>>> line(
+        1, std::vector<std::vector<float>>(10, std::vector<float>(5, 1.0f)));
+    line[0][4][2] = -std::numeric_limits<float>::infinity();
+    bwtest::WriteLineFile(dir / "late.xol1", kStart, 0.5, 2.0f, line);
+    line[0][4][2] = 1.0f;
+    line[0][8][2] = nan;
+    bwtest::WriteLineFile(dir / "after.xol1", kStart, 0.5, 2.0f, line);
+    EXPECT_EXIT(Setup({{0, 1, 0, 5, 0, 0, "nan.xol0"}}), testing::ExitedWithCode(1),
+                "XOL data holds a value that is not a finite number: .*nan.xol0, item 1 \"Item "
+                "1\", step 3\n");
+    EXPECT_EXIT(Setup({{0, 1, 0, 5, 1, 1, "late.xol1"}}), testing::ExitedWithCode(1),
+                "XOL data holds a value that is not a finite number: .*late.xol1, item 1 \"Item "
+                "1\", step 4, point 2\n");
+    Setup({{0, 1, 0, 5, 1, 1, "after.xol1"}});
+    Steps(1, 20);
+    EXPECT_FLOAT_EQ(BoundaryValues(1).Value(2, 1), 1.0f);
 }
 
 }  // namespace

@@ -43,14 +43,18 @@ test-asan: deps
 	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
 	ctest --test-dir $(ASAN_BUILD) --output-on-failure -j $(JOBS)
 
-# The parameter parser under libFuzzer for FUZZ_SECONDS seconds.
+# The parameter parser, then the data-file readers, under libFuzzer for
+# FUZZ_SECONDS seconds each.
 fuzz:
 	@scripts/install-deps fuzz
 	CC=clang CXX=clang++ cmake -S . -B $(FUZZ_BUILD) -DCMAKE_BUILD_TYPE=Debug -DBW_FUZZ=ON -DBW_TESTS=OFF >/dev/null
-	cmake --build $(FUZZ_BUILD) -j $(JOBS) --target kvt_fuzz
-	mkdir -p $(FUZZ_BUILD)/corpus
+	cmake --build $(FUZZ_BUILD) -j $(JOBS) --target kvt_fuzz xol_fuzz
+	mkdir -p $(FUZZ_BUILD)/corpus $(FUZZ_BUILD)/xol_corpus
 	$(FUZZ_BUILD)/tests/fuzz/kvt_fuzz -max_total_time=$(FUZZ_SECONDS) -max_len=4096 \
 	    $(FUZZ_BUILD)/corpus tests/fuzz/corpus
+	LSAN_OPTIONS=suppressions=$(CURDIR)/tests/asan.supp:print_suppressions=0 \
+	$(FUZZ_BUILD)/tests/fuzz/xol_fuzz -max_total_time=$(FUZZ_SECONDS) -max_len=4096 \
+	    $(FUZZ_BUILD)/xol_corpus tests/fuzz/xol_corpus
 
 clean:
 	rm -rf build

@@ -1,9 +1,11 @@
 #include "output/disturbance.hpp"
 
 #include <algorithm>
+#include <cerrno>
 #include <climits>
 #include <cmath>
 #include <cstdio>
+#include <cstring>
 #include <filesystem>
 #include <new>
 #include <string>
@@ -152,8 +154,9 @@ void SetupDisturbanceAreas() {
     LockOutputFile("SetupDisturbanceAreas", d.areaFileName);
     s.reportUnit = GetFreeUnit();
     if (s.reportUnit <= 0 || !OpenUnit(s.reportUnit, d.areaFileName, "w")) {
+        const int error = errno;
         s.reportUnit = 0;
-        StopRun("Unable to create file " + d.areaFileName);
+        StopRun("Unable to create file " + d.areaFileName + ": " + std::strerror(error));
     }
 
     // The code map: values cut to whole numbers, 0 or less outside every area.
@@ -208,7 +211,13 @@ void CreateOutputDisturbance() {
     LockOutputFile("CreateOutputDisturbance", d.fileName);
     int status = 0;
     XolCreateFile(s.file, d.fileName, &status);
-    if (status != 0) StopRun("Unable to open " + d.fileName);
+    if (status != 0) {
+        // The data layer's text ends with the file and its reason.
+        const std::string& text = s.file.lastErrorText;
+        const size_t named = text.find(d.fileName + ": ");
+        StopRun("Unable to open " + d.fileName +
+                (named == std::string::npos ? "" : text.substr(named + d.fileName.size())));
+    }
     XolWriteStatic(s.file, g.bed.data(), 100079, "Bathymetry", 1000);
 }
 

@@ -17,8 +17,10 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cmath>
 #include <cstdio>
+#include <cstring>
 #include <new>
 
 #include "data/xolfile.hpp"
@@ -142,12 +144,23 @@ void WriteOutputHotstart(int32_t step) {
         gHotstartState.locked = true;
     }
     const std::string temporary = HotstartTemporaryName(h.fileName);
+    // A stop names File_Name, which the user knows, with the reason the data
+    // layer gave for the temporary file behind it.
+    auto stop = [&](const std::string& text, const std::string& reason) {
+        Abandon(f, temporary, text + (reason.empty() ? "" : ": " + reason));
+    };
+    auto layerReason = [&]() {
+        const std::string named = temporary + ": ";
+        const size_t at = f.lastErrorText.find(named);
+        return at == std::string::npos ? std::string() : f.lastErrorText.substr(at + named.size());
+    };
     int status = 0;
     XolCreateFile(f, temporary, &status);
-    if (status != 0) Abandon(f, temporary, XolErrorText(status) + " for " + h.fileName);
+    if (status != 0) stop(XolErrorText(status) + " for " + h.fileName, layerReason());
     auto write = [&](const float* values) {
         XolWriteDynamic(f, values, &status);
-        if (status != 0) Abandon(f, temporary, "TRNXOL Error: " + XolErrorText(status));
+        if (status != 0)
+            stop("TRNXOL Error: " + XolErrorText(status) + ": " + h.fileName, layerReason());
     };
 
     FillScalars(v, date, origin.latitude, origin.north);
@@ -171,10 +184,12 @@ void WriteOutputHotstart(int32_t step) {
     }
 
     XolFlush(f, &status);
-    if (status != 0) Abandon(f, temporary, "Flush error");
-    XolClose(f);
-    if (!SyncToDisk(temporary)) Abandon(f, temporary, "Flush error");
+    const std::string flushError = "Flush error: " + h.fileName;
+    if (status != 0) stop(flushError, layerReason());
+    XolClose(f, &status);
+    if (status != 0) stop(flushError, layerReason());
+    if (!SyncToDisk(temporary)) stop(flushError, std::strerror(errno));
     if (std::rename(temporary.c_str(), h.fileName.c_str()) != 0)
-        Abandon(f, temporary, XolErrorText(kXolCreateFile) + " for " + h.fileName);
+        stop(XolErrorText(kXolCreateFile) + " for " + h.fileName, std::strerror(errno));
     XolPrintSummary(f);
 }

@@ -232,10 +232,12 @@ TEST_F(Disturbance, StopsThatAModelFileCanReach) {
         // The report's folder can't be made where a file stands.
         {Section(1, point, "2", "dist.xol2",
                  "bed.xol2/r.txt\")\n" + bwtest::DataFileSection("codes.xol2")),
-         "Unable to create file " + dir.path.string() + "/bed.xol2/r.txt"},
+         "Unable to create file " + dir.path.string() + "/bed.xol2/r.txt: Not a directory"},
         {Section(1, point, "2", "dist.xol2", "r.txt\")\n" + bwtest::DataFileSection("small.xol2")),
-         "XOL data does not have the correct number of grid points (x.dir.)"},
-        {Section(1, point, "1", "no/d.xol2"), "Unable to open " + dir.path.string() + "/no/d.xol2"},
+         "XOL data does not have the correct number of grid points (x.dir.): " +
+             dir / "small.xol2" + ": 41 points where the grid has 60"},
+        {Section(1, point, "1", "no/d.xol2"),
+         "Unable to open " + dir.path.string() + "/no/d.xol2: no such file or directory"},
         {Section(1, "Scaling_Type = 0\nGrid_Point = 24, 32\n", "1"),
          "Output_Disturbance_2D: Grid_Point (24,32) lies outside the grid"},
     };

@@ -193,7 +193,7 @@ TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
     const std::string good = bwtest::ReadFile(hot);
     fs::create_directory(temporary);
     bwtest::RunResult r = RunBasin(Span(0, 0));
-    EXPECT_EQ(r.out, "Unable to create file for " + hot + "\n");
+    EXPECT_EQ(r.out, "Unable to create file for " + hot + ": is a directory\n");
     EXPECT_TRUE(fs::is_directory(temporary));
     EXPECT_EQ(bwtest::ReadFile(hot), good);
     fs::remove(temporary);
@@ -201,7 +201,7 @@ TEST_F(HotstartBasin, AFailedWriteLeavesTheFormerFileWhole) {
     r = RunBasin(Span(0, 0),
                  "trap '' XFSZ; ulimit -f " + std::to_string(good.size() / 512 - 8) + ";");
     EXPECT_EQ(r.exitCode, 1);
-    EXPECT_EQ(r.out, "Flush error\n");
+    EXPECT_EQ(r.out, "Flush error: " + hot + ": file too large\n");
     EXPECT_TRUE(EndsAbnormally());
     EXPECT_FALSE(fs::exists(temporary));
     EXPECT_EQ(bwtest::ReadFile(hot), good);
@@ -218,7 +218,8 @@ TEST_F(HotstartBasin, AStateFileWithoutItsItemsIsRefused) {
             {{"Bathymetry_Selection", "Hot_Start = true\n" + bwtest::DataFileSection("one.xol2")},
              {"SURFACE_ELEVATION", "-"}});
     EXPECT_EQ(r.exitCode, 1);
-    EXPECT_EQ(r.out, "TRNXOL Error: Unable to read dynamic item\n");
+    EXPECT_EQ(r.out, "TRNXOL Error: Unable to read dynamic item: " + dir / "one.xol2" +
+                         ": no more data: the file holds 1 step of 1 item\n");
     EXPECT_TRUE(EndsAbnormally());
 }
 

@@ -675,14 +675,26 @@ void XolCheckFiniteSteps(const std::string& path, int32_t items, int32_t first, 
 
 namespace {
 
+// The file and what differs follow the fixed text, so that the user sees
+// which map is off and by how much.
 void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
     const bool x = axis == 1;
-    if (f.axes[axis - 1].spacing != spacing)
-        StopRun(x ? "XOL data does not have the correct grid spacing (x-dir.)"
-                  : "XOL data does not have the correct grid spacing (y-dir.)");
-    if (f.axes[axis - 1].count != last + 1)
-        StopRun(x ? "XOL data does not have the correct number of grid points (x.dir.)"
-                  : "XOL data does not have the correct number of grid points (y.dir.)");
+    const XolAxis& a = f.axes[axis - 1];
+    char detail[160];
+    if (a.spacing != spacing) {
+        std::snprintf(detail, sizeof detail, "spacing %.9g where the grid has %.9g",
+                      static_cast<double>(a.spacing), static_cast<double>(spacing));
+        StopRun(std::string(x ? "XOL data does not have the correct grid spacing (x-dir.)"
+                              : "XOL data does not have the correct grid spacing (y-dir.)") +
+                ": " + f.path + ": " + detail);
+    }
+    if (a.count != last + 1) {
+        std::snprintf(detail, sizeof detail, "%d points where the grid has %d", a.count, last + 1);
+        StopRun(
+            std::string(x ? "XOL data does not have the correct number of grid points (x.dir.)"
+                          : "XOL data does not have the correct number of grid points (y.dir.)") +
+            ": " + f.path + ": " + detail);
+    }
 }
 
 // Reads items 1 to item, so that the selected one stays in values, and checks it.
@@ -717,4 +729,12 @@ void ReadGridFile2D(const std::string& path, int32_t item, float* values, const 
     CheckAxis(f, 1, grid.dx, grid.J);
     CheckAxis(f, 2, grid.dy, grid.K);
     ReadItems(f, item, values);
+}
+
+std::string MapValueAt(const std::string& path, float value, size_t index, int32_t J) {
+    const size_t stride = static_cast<size_t>(J) + 1;
+    char text[96];
+    std::snprintf(text, sizeof text, "%.7g at point (%zu,%zu)", static_cast<double>(value),
+                  index % stride, index / stride);
+    return ": " + path + ": " + text;
 }

@@ -166,3 +166,6 @@ struct GridShape {
 // finite number.
 void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid);
 void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid);
+// What a map's range check names behind its own text: ": <path>: <value> at
+// point (j,k)", index counting x fastest over a grid of highest x index J.
+std::string MapValueAt(const std::string& path, float value, size_t index, int32_t J);

@@ -129,7 +129,8 @@ void SetupExplicitFilter(KvtHandle target) {
         for (size_t i = 0; i < g.Points(); ++i) {
             const float v = f.filterCoef[i];
             if ((v < 0.0f || v > 1.0f) && g.bed[i] < 0.0f)
-                StopRun("_SetupExplicitFilter: filter coefficient outside interval 0<=f<=1");
+                StopRun("_SetupExplicitFilter: filter coefficient outside interval 0<=f<=1" +
+                        MapValueAt(f.fileName, v, i, g.J));
         }
     } else {
         StopRun("_SetupExplicitFilter: Wrong type of filter");

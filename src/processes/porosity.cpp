@@ -48,6 +48,7 @@ void SetupPorosity(KvtHandle target) {
     for (size_t i = 0; i < g.Points(); ++i) {
         const float n = p.porosity[i];
         if ((n < 0.2f || n > 1.0f) && g.bed[i] < 0.0f)
-            StopRun("_SetupPorosity: porosity value outside interval 0.2<=n<=1");
+            StopRun("_SetupPorosity: porosity value outside interval 0.2<=n<=1" +
+                    MapValueAt(p.fileName, n, i, g.J));
     }
 }

@@ -41,7 +41,8 @@ void SetupSpongeLayer(KvtHandle target) {
             for (size_t i = 0; i < g.Points(); ++i) {
                 const float v = s.sponge[i];
                 if ((v < 1.0f || v > 100.0f) && g.bed[i] < 0.0f)
-                    StopRun("_SetupSpongeLayer: sponge coefficient outside interval 1<=s<=100");
+                    StopRun("_SetupSpongeLayer: sponge coefficient outside interval 1<=s<=100" +
+                            MapValueAt(s.fileName, v, i, g.J));
             }
         }
     }

@@ -44,14 +44,14 @@ test-asan: deps
 	ctest --test-dir $(ASAN_BUILD) --output-on-failure -j $(JOBS)
 
 # The parameter parser, then the data-file readers, under libFuzzer for
-# FUZZ_SECONDS seconds each.
+# FUZZ_SECONDS seconds each; the bad-input corpus of the suite seeds the first.
 fuzz:
 	@scripts/install-deps fuzz
 	CC=clang CXX=clang++ cmake -S . -B $(FUZZ_BUILD) -DCMAKE_BUILD_TYPE=Debug -DBW_FUZZ=ON -DBW_TESTS=OFF >/dev/null
 	cmake --build $(FUZZ_BUILD) -j $(JOBS) --target kvt_fuzz xol_fuzz
 	mkdir -p $(FUZZ_BUILD)/corpus $(FUZZ_BUILD)/xol_corpus
 	$(FUZZ_BUILD)/tests/fuzz/kvt_fuzz -max_total_time=$(FUZZ_SECONDS) -max_len=4096 \
-	    $(FUZZ_BUILD)/corpus tests/fuzz/corpus
+	    $(FUZZ_BUILD)/corpus tests/fuzz/corpus tests/system/bad_input
 	LSAN_OPTIONS=suppressions=$(CURDIR)/tests/asan.supp:print_suppressions=0 \
 	$(FUZZ_BUILD)/tests/fuzz/xol_fuzz -max_total_time=$(FUZZ_SECONDS) -max_len=4096 \
 	    $(FUZZ_BUILD)/xol_corpus tests/fuzz/xol_corpus

@@ -279,13 +279,12 @@ void SetupInternalGeneration(KvtHandle target) {
     s = GenerationState{};
     KvtGetInteger(section, "Number_Of_Records", s.numberOfRecords);
     if (s.numberOfRecords <= 0) return;
-    try {
-        s.records.resize(static_cast<size_t>(s.numberOfRecords));
-        s.lineFiles.resize(static_cast<size_t>(s.numberOfRecords));
-    } catch (const std::bad_alloc&) {
-        StopRun("Unable to allocate memory");
+    // Record by record as their sections are found: a count beyond the
+    // sections stops at the first one missing, before room for it is taken.
+    for (int32_t i = 1; i <= s.numberOfRecords; ++i) {
+        s.lineFiles.emplace_back();  // a record's line file opens as it is read
+        ReadRecord(section, i, s.records.emplace_back());
     }
-    for (int32_t i = 1; i <= s.numberOfRecords; ++i) ReadRecord(section, i, s.records[i - 1]);
     if (gBasic.numberOfDimensions != 2) return;
 
     const GridState& g = gGrid;

@@ -89,6 +89,10 @@ int KvtParamCount(KvtHandle section, std::string_view key);
 // each target, section or keyword of the file that no look-up found (with the
 // nearest name the run asked for in its place, when one is close) and for
 // each repeat of a name of which one instance was read.
+// Given a section instead of the file, the same for what it holds: a reader
+// that stops on a value of a section it has read says first what it did not
+// read there, since a misspelt key is the likely cause of a default that
+// can't be meant.
 void KvtWarnUnread(KvtHandle file);
 
 // Writes one line into the log of this layer (nothing when it is not open).

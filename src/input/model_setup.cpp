@@ -28,13 +28,20 @@ BathymetrySettings gBathymetry;
 
 namespace {
 
+// A stop on a value of a section that is read: what the section holds and
+// no setting read comes first, as the likely cause.
+[[noreturn]] void StopSetting(KvtHandle section, const std::string& text) {
+    KvtWarnUnread(section);
+    StopRun(text);
+}
+
 void ReadBasicModelParameters(KvtHandle target) {
     const KvtHandle section = KvtOpenSection(target, "BASIC_MODEL_PARAMETERS");
     gBasic = BasicSettings{};
     KvtGetInteger(section, "NUMBER_OF_DIMENSIONS", gBasic.numberOfDimensions);
     if (gBasic.numberOfDimensions != 1 && gBasic.numberOfDimensions != 2)
-        StopRun(Filled("ReadModelSetup: NUMBER_OF_DIMENSIONS must be 1 or 2, not %",
-                       gBasic.numberOfDimensions));
+        StopSetting(section, Filled("ReadModelSetup: NUMBER_OF_DIMENSIONS must be 1 or 2, not %",
+                                    gBasic.numberOfDimensions));
     if (gBasic.numberOfDimensions == 1)
         KvtGetInteger(section, "DELETE_FEM_KVT_FILE", gBasic.deleteFemKvtFile);
     KvtGetInteger(section, "OPEN_LOG_FILE_AFTER_RUN", gBasic.openLogFileAfterRun);
@@ -77,27 +84,31 @@ void ReadSimulationPeriod(KvtHandle target) {
     // a normal end with empty or meaningless output.
     const std::string steps = "Time_step_count = " + std::to_string(count);
     if (count < 1 || count == INT32_MAX)
-        StopRun("ReadModelSetup: " + steps +
-                " in section Simulation_Period; the number of time steps must be from 1 to "
-                "2147483646");
+        StopSetting(section,
+                    "ReadModelSetup: " + steps +
+                        " in section Simulation_Period; the number of time steps must be from 1 to "
+                        "2147483646");
     // A boundary series is held in memory as a table of four values a step
     // while it is resampled to the steps of the run.
     CheckMemory(steps, count + 1.0, 4.0 * sizeof(float));
     if (!(dt > 0.0) || !std::isfinite(dt))
-        StopRun(
+        StopSetting(
+            section,
             Filled("ReadModelSetup: Time_step_interval = % in section Simulation_Period; the "
                    "time step must be a number of seconds above 0",
                    dt));
     if (warmUp < 0)
-        StopRun(
-            Filled("ReadModelSetup: Warm_up_period = % in section Simulation_Period; the "
-                   "warm-up must be 0 or more time steps",
-                   warmUp));
+        StopSetting(section,
+                    Filled("ReadModelSetup: Warm_up_period = % in section Simulation_Period; the "
+                           "warm-up must be 0 or more time steps",
+                           warmUp));
     if (startGiven && !DateExists(start[0], start[1], start[2], start[3], start[4], start[5])) {
         char text[96];
         std::snprintf(text, sizeof text, "%d,%d,%d,%d,%d,%d", start[0], start[1], start[2],
                       start[3], start[4], start[5]);
-        StopRun("ReadModelSetup: Start_time = " + std::string(text) +
+        StopSetting(
+            section,
+            "ReadModelSetup: Start_time = " + std::string(text) +
                 " in section Simulation_Period is not a date; year (0 to 9999), month, day, "
                 "hour, minute and second of an existing date are expected");
     }

@@ -124,7 +124,8 @@ const char* kvtGetParamText(KvtHandle param);
 // parent when one is close; nothing inside an unread section), and a second
 // instance of a name of which another instance was read ("is given twice").
 // Calls report with each text (without a closing period) and returns their
-// number.
+// number. Given a target or section instead of the file, only what stands
+// inside it is reported, as a reader does that stops on a value of its own.
 using KvtReportFn = void (*)(const char* text, void* data);
 int kvtReportUnread(KvtHandle file, KvtReportFn report, void* data);
 

@@ -77,14 +77,22 @@ int kvtReportUnread(KvtHandle file, KvtReportFn report, void* data) {
     int index = -1;
     KvtTree* tree = KvtFindTree(file, &index);
     if (tree == nullptr) return 0;
-    if (index != 0) {
+    if (tree->nodes[index].kind == KvtNodeKind::Keyword ||
+        tree->nodes[index].kind == KvtNodeKind::Param) {
         KvtSetError(kKvtErrHandle);
         return 0;
     }
+    // Within the node given: the file, or a target or section and what it holds.
+    auto inside = [&](size_t i) {
+        for (int up = tree->nodes[i].parent; up >= 0; up = tree->nodes[up].parent)
+            if (up == index) return true;
+        return false;
+    };
     int count = 0;
     for (size_t i = 1; i < tree->nodes.size(); ++i) {
         const KvtNode& node = tree->nodes[i];
         if (node.kind == KvtNodeKind::Param || node.read) continue;
+        if (index != 0 && !inside(i)) continue;
         // Inside an unread section only the section itself is reported.
         const KvtNode& parent = tree->nodes[node.parent];
         if (parent.kind != KvtNodeKind::File && !parent.read) continue;

@@ -448,6 +448,11 @@ TEST(KvtReport, UnreadNamesWithTheNearestAskedAndRepeats) {
     EXPECT_EQ(after[5] + "/" + after[6],
               "Key a in section Extra (line 12) is not read by this run/"
               "Key b in section Extra (line 13) is not read by this run");
+    // Given a section, only what it holds; a keyword is no place to report on.
+    EXPECT_EQ(Report(kvtSectionByNameNum(model, "Extra", 1)),
+              (std::vector<std::string>{after[5], after[6]}));
+    EXPECT_EQ(Report(kvtKeywordByNameNum(period, "Depth", 1)), std::vector<std::string>{});
+    EXPECT_EQ(kvtPeekErrorGlb(), kKvtErrHandle);
     kvtClose(&file);
 }
 

@@ -202,9 +202,9 @@ TEST(SurfaceEstimate, CoversThePointsOfTheChainsAndNoOther) {
 // log is open: the dying child sends them to standard error for the check.
 TEST(BlowUp, ANotANumberInTheStateStopsTheRunAtItsPoint) {
     for (const int32_t handle : {0, 1}) {
-        bwtest::BasinSpec spec;
-        spec.convectiveHandle = handle;
-        bwtest::MakeBasin(spec);
+        bwtest::BasinSpec basin;
+        basin.convectiveHandle = handle;
+        bwtest::MakeBasin(basin);
         bwtest::SetSurface([](float, float) { return 0.0f; });
         // As a solve leaves it: the depths of the next sweep hold it, and
         // the first point that sweep meets is named.

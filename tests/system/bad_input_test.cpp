@@ -146,10 +146,10 @@ TEST(BadInputFiles, AnOutputFileWrittenByAnotherRunIsRefused) {
     bwtest::TempDir dir;
     MakeDataFile(dir, "bed.xol2");
     const CorpusCase out = ReadCase(kCorpus / "records_huge.bw");
-    std::string spec = out.sections.at("Output_Deterministic_2D");
-    spec.replace(spec.find("2147483647"), 10, "1");
+    std::string body = out.sections.at("Output_Deterministic_2D");
+    body.replace(body.find("2147483647"), 10, "1");
     bwtest::WriteFile(dir / "m.bw",
-                      bwtest::ModelText("bed.xol2", {{"Output_Deterministic_2D", spec}}));
+                      bwtest::ModelText("bed.xol2", {{"Output_Deterministic_2D", body}}));
 
     const int fd = open((dir / "out.xol2.lock").c_str(), O_RDWR | O_CREAT, 0644);
     ASSERT_GE(fd, 0);

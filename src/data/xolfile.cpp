@@ -680,21 +680,15 @@ namespace {
 void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
     const bool x = axis == 1;
     const XolAxis& a = f.axes[axis - 1];
-    char detail[160];
-    if (a.spacing != spacing) {
-        std::snprintf(detail, sizeof detail, "spacing %.9g where the grid has %.9g",
-                      static_cast<double>(a.spacing), static_cast<double>(spacing));
-        StopRun(std::string(x ? "XOL data does not have the correct grid spacing (x-dir.)"
-                              : "XOL data does not have the correct grid spacing (y-dir.)") +
-                ": " + f.path + ": " + detail);
-    }
-    if (a.count != last + 1) {
-        std::snprintf(detail, sizeof detail, "%d points where the grid has %d", a.count, last + 1);
-        StopRun(
-            std::string(x ? "XOL data does not have the correct number of grid points (x.dir.)"
-                          : "XOL data does not have the correct number of grid points (y.dir.)") +
-            ": " + f.path + ": " + detail);
-    }
+    if (a.spacing != spacing)
+        XolStopOnContent(x ? "XOL data does not have the correct grid spacing (x-dir.)"
+                           : "XOL data does not have the correct grid spacing (y-dir.)",
+                         f, XolSpacingFound(a.spacing, spacing));
+    if (a.count != last + 1)
+        XolStopOnContent(
+            x ? "XOL data does not have the correct number of grid points (x.dir.)"
+              : "XOL data does not have the correct number of grid points (y.dir.)",
+            f, std::to_string(a.count) + " points where the grid has " + std::to_string(last + 1));
 }
 
 // Reads items 1 to item, so that the selected one stays in values, and checks it.
@@ -737,4 +731,26 @@ std::string MapValueAt(const std::string& path, float value, size_t index, int32
     std::snprintf(text, sizeof text, "%.7g at point (%zu,%zu)", static_cast<double>(value),
                   index % stride, index / stride);
     return ": " + path + ": " + text;
+}
+
+void XolStopOnContent(const std::string& text, const XolFile& file, const std::string& detail) {
+    StopRun(text + ": " + file.path + (detail.empty() ? "" : ": " + detail));
+}
+
+std::string XolAxesFound(const XolFile& file) {
+    return "it has " + std::to_string(file.dimension) +
+           (file.dimension == 1 ? " spatial axis" : " spatial axes");
+}
+
+std::string XolItemsFound(const XolFile& file, const std::string& wanted) {
+    return "it holds " + std::to_string(file.noDynamicItems) +
+           (file.noDynamicItems == 1 ? " item" : " items") + " where " + wanted + " " +
+           (wanted == "1" ? "is" : "are") + " needed";
+}
+
+std::string XolSpacingFound(float found, float grid) {
+    char text[96];
+    std::snprintf(text, sizeof text, "spacing %.7g where the grid has %.7g",
+                  static_cast<double>(found), static_cast<double>(grid));
+    return text;
 }

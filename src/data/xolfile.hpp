@@ -166,6 +166,15 @@ struct GridShape {
 // finite number.
 void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid);
 void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid);
+// A stop on what a file holds that a reader can't use: the reader's text,
+// then the file and what it found there (": <path>: <detail>").
+[[noreturn]] void XolStopOnContent(const std::string& text, const XolFile& file,
+                                   const std::string& detail);
+// Details for XolStopOnContent: "it has 2 spatial axes", "it holds 1 item
+// where <wanted> are needed", "spacing 2 where the grid has 1".
+std::string XolAxesFound(const XolFile& file);
+std::string XolItemsFound(const XolFile& file, const std::string& wanted);
+std::string XolSpacingFound(float found, float grid);
 // What a map's range check names behind its own text: ": <path>: <value> at
 // point (j,k)", index counting x fastest over a grid of highest x index J.
 std::string MapValueAt(const std::string& path, float value, size_t index, int32_t J);

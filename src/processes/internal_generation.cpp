@@ -65,10 +65,14 @@ void OpenInternalLineFile(const InternalGenRecord& r, InternalLineFile& l) {
     l.file = XolOpenRead(r.fileName);
     XolPrintSummary(l.file);
     XolFile& f = l.file;
-    if (f.dimension != 1) StopRun("XOL data is not 1D");
-    if (f.noDynamicItems != 2) StopRun("XOL data does not contain the correct number of items");
+    if (f.dimension != 1) XolStopOnContent("XOL data is not 1D", f, XolAxesFound(f));
+    if (f.noDynamicItems != 2)
+        XolStopOnContent("XOL data does not contain the correct number of items", f,
+                         XolItemsFound(f, "2"));
     if (f.axes[0].count != r.pointCount + 1)
-        StopRun("XOL data does not have the correct number of grid points (x.dir.)");
+        XolStopOnContent("XOL data does not have the correct number of grid points (x.dir.)", f,
+                         std::to_string(f.axes[0].count) + " points where the line has " +
+                             std::to_string(r.pointCount + 1));
 
     // Times in seconds from the simulation start; a file on a relative axis
     // counts from the simulation start itself.

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstdio>
 #include <new>
 
 #include "data/tsfunc.hpp"
@@ -95,7 +96,10 @@ struct FileTimes {
 FileTimes CheckPeriod(const XolFile& f) {
     DateTime date;
     if (f.timeAxisType != kXolTimeCalendar || !ParseDateTime(f.startDateTime, date))
-        StopRun("XOL data does not contain a calendar time axis");
+        XolStopOnContent("XOL data does not contain a calendar time axis", f,
+                         f.timeAxisType == kXolTimeCalendar
+                             ? "its start \"" + std::string(Trim(f.startDateTime)) + "\" is no date"
+                             : "its time axis counts from no date");
     const GridState& g = gGrid;
     FileTimes t;
     t.start = SecondsBetween(g.start, date);
@@ -108,8 +112,14 @@ FileTimes CheckPeriod(const XolFile& f) {
     const double eps = 1e-6 * std::max(g.dt, 1e-3);
     const double fileEnd = t.start + (t.records - 1) * t.step;
     if (t.records < 2 || t.start > eps || fileEnd < runEnd - eps ||
-        (t.records > 1 && t.step <= 0.0))
-        StopRun("XOL data does not cover the simulation period");
+        (t.records > 1 && t.step <= 0.0)) {
+        char detail[200];
+        std::snprintf(detail, sizeof detail,
+                      "it runs from %.6g s to %.6g s of the run in %d records, the run from 0 s "
+                      "to %.6g s",
+                      t.start, fileEnd, t.records, runEnd);
+        XolStopOnContent("XOL data does not cover the simulation period", f, detail);
+    }
     return t;
 }
 
@@ -186,18 +196,25 @@ void OpenBoundaryLineFile(const BoundaryRecord& r, int32_t rows, BoundaryLineFil
     l.file = XolOpenRead(r.fileName);
     XolPrintSummary(l.file);
     const XolFile& f = l.file;
-    if (f.dimension != 1) StopRun("XOL data is not 1D");
+    if (f.dimension != 1) XolStopOnContent("XOL data is not 1D", f, XolAxesFound(f));
     const int32_t items = r.dataSpecification == 1 ? 1 : 3;
-    if (f.noDynamicItems != items) StopRun("XOL data does not contain the correct number of items");
-    if (r.dataSpecification == 2 && f.dataType != 1) StopRun("XOL data is not hot transfer data");
+    if (f.noDynamicItems != items)
+        XolStopOnContent("XOL data does not contain the correct number of items", f,
+                         XolItemsFound(f, std::to_string(items)));
+    if (r.dataSpecification == 2 && f.dataType != 1)
+        XolStopOnContent("XOL data is not hot transfer data", f,
+                         "its data-type flag is " + std::to_string(f.dataType) + ", not 1");
     const GridState& g = gGrid;
     const bool alongK = r.orientation == 1 || r.orientation == 3;
     const float spacing = alongK ? g.dy : g.dx;
     if (std::fabs(f.axes[0].spacing - spacing) > 1e-5f * spacing)
-        StopRun(alongK ? "XOL data does not have the correct grid spacing (y-dir.)"
-                       : "XOL data does not have the correct grid spacing (x-dir.)");
+        XolStopOnContent(alongK ? "XOL data does not have the correct grid spacing (y-dir.)"
+                                : "XOL data does not have the correct grid spacing (x-dir.)",
+                         f, XolSpacingFound(f.axes[0].spacing, spacing));
     if (f.axes[0].count != rows)
-        StopRun("XOL data does not have the correct number of grid points (x.dir.)");
+        XolStopOnContent(
+            "XOL data does not have the correct number of grid points (x.dir.)", f,
+            std::to_string(f.axes[0].count) + " points where the line has " + std::to_string(rows));
     const FileTimes t = CheckPeriod(f);
 
     l.itemsInFile = items;
@@ -257,11 +274,15 @@ void ReadTimeSeries0D(const std::string& path, int32_t count, const int32_t* ite
                       const int32_t* methods, std::vector<float>& series) {
     XolFile f = XolOpenRead(path);
     XolPrintSummary(f);
-    if (f.dimension != 0) StopRun("XOL data is not 0D");
-    if (f.noDynamicItems < count) StopRun("XOL data does not contain the correct number of items");
+    if (f.dimension != 0) XolStopOnContent("XOL data is not 0D", f, XolAxesFound(f));
+    if (f.noDynamicItems < count)
+        XolStopOnContent("XOL data does not contain the correct number of items", f,
+                         XolItemsFound(f, "at least " + std::to_string(count)));
     for (int32_t e = 0; e < count; ++e)
         if (items[e] < 1 || items[e] > f.noDynamicItems)
-            StopRun("XOL data does not contain the correct number of items");
+            XolStopOnContent("XOL data does not contain the correct number of items", f,
+                             "it holds " + std::to_string(f.noDynamicItems) + " items, and item " +
+                                 std::to_string(items[e]) + " is asked for");
     const FileTimes t = CheckPeriod(f);
 
     // The records the run needs, from the one before the first at or before

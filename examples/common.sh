@@ -18,3 +18,17 @@ make_maps() {
     "$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 1000 \
         --title "$2" >/dev/null
 }
+
+# Runs bw on a model file with its screen output kept in a file (the model's
+# name with .out, or the second argument); when bw fails, shows the end of that
+# output, where the reason is, and stops with bw's exit code.
+#   run_bw model.bw [screen output file]
+run_bw() {
+    local out=${2:-${1%.bw}.out} status=0
+    "$bw" "$1" >"$out" 2>&1 || status=$?
+    if [ "$status" -ne 0 ]; then
+        echo "bw $1 ended with exit code $status. The end of its screen output ($here/$out):" >&2
+        tail -20 "$out" >&2
+        exit "$status"
+    fi
+}

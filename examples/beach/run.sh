@@ -11,13 +11,7 @@ make_maps "Beach with a mound" "Sponge layer behind the generation line"
 
 run() {
     echo "Running bw $1 ..."
-    local status=0
-    "$bw" "$1" >"${1%.bw}.out" 2>&1 || status=$?
-    if [ "$status" -ne 0 ]; then
-        echo "bw ended with exit code $status:"
-        tail -20 "${1%.bw}.out"
-        exit "$status"
-    fi
+    run_bw "$1"
     grep -A6 "Run Statistics" "${1%.bw}.log" | sed -n 2,6p
 }
 run beach.bw

@@ -9,13 +9,7 @@ make_maps "Flume with a plane slope" "Sponge layer before the wall"
     --types 100078 --units 1000 --title "Incoming wave" >/dev/null
 
 echo "Running bw flume.bw (100 periods) ..."
-status=0
-"$bw" flume.bw >run.out 2>&1 || status=$?
-if [ "$status" -ne 0 ]; then
-    echo "bw ended with exit code $status:"
-    tail -20 run.out
-    exit "$status"
-fi
+run_bw flume.bw run.out
 sed -n '/Scheme Stability/,/^=====/p' flume.log
 grep -A6 "Run Statistics" flume.log | sed -n 2,6p
 

@@ -12,13 +12,7 @@ make_maps "Harbour behind a breakwater" "Sponge layer behind the generation line
     --types 999 --units 4700 --title "Source of the generation line" >/dev/null
 
 echo "Running bw harbour.bw ..."
-status=0
-"$bw" harbour.bw >harbour.out 2>&1 || status=$?
-if [ "$status" -ne 0 ]; then
-    echo "bw ended with exit code $status:"
-    tail -20 harbour.out
-    exit "$status"
-fi
+run_bw harbour.bw
 grep -A6 "Run Statistics" harbour.log | sed -n 2,6p
 echo
 echo "Area report of the last output (disturbance.txt):"

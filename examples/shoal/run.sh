@@ -10,7 +10,7 @@ make_maps "Flume with a shoal" "Sponge layer"
 
 echo "Running bw shoal.bw ..."
 start=$(date +%s.%N)
-"$bw" shoal.bw >/dev/null
+run_bw shoal.bw
 end=$(date +%s.%N)
 printf "Done in %.1f s. The log is %s/shoal.log\n\n" "$(echo "$end - $start" | bc)" "$here"
 grep -A6 "Run Statistics" shoal.log | sed -n 2,6p

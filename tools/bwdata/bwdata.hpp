@@ -35,7 +35,10 @@ std::string ImportCsv(const std::string& input, const std::string& output,
 
 // A file as text: a series or line file as CSV, a map at a step as an ESRI
 // ASCII grid (.asc) or as the columns j,k,value (.csv). step < 0: the last.
-std::string ExportText(const std::string& input, const std::string& output, int item, int step);
+// staticItem > 0 exports that static item (from 1) instead: a map as above, a
+// line as one CSV row under the positions of its points.
+std::string ExportText(const std::string& input, const std::string& output, int item, int step,
+                       int staticItem = 0);
 
 // Writes what is left of a text on the given path atomically: to a scratch
 // name first, renamed when complete.

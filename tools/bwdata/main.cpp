@@ -26,7 +26,8 @@ const char* kUsage =
     "                    [--types C,...] [--units U,...] [--title TEXT]\n"
     "  bwdata import-csv LINE.csv -o OUT.xol1 --dx DX --start \"...\" [--type C] [--unit U] "
     "[--name TEXT]\n"
-    "  bwdata export FILE -o OUT.csv|OUT.asc [--item N] [--step N]\n";
+    "  bwdata export FILE -o OUT.csv|OUT.asc [--item N] [--step N]\n"
+    "  bwdata export FILE -o OUT.csv|OUT.asc --static N\n";
 
 int Fail(const std::string& text) {
     std::fprintf(stderr, "bwdata: %s\n", text.c_str());
@@ -54,6 +55,14 @@ bool Integers(const std::string& text, std::vector<int>& out) {
     return !out.empty();
 }
 
+// The static items by the numbers that `export --static` takes (the summary
+// lists the dynamic items only).
+void PrintStaticItems(const XolFile& f) {
+    for (size_t n = 0; n < f.staticItems.size(); ++n)
+        std::printf("  Static item %zu: %s (%s)\n", n + 1, f.staticItems[n].name.c_str(),
+                    f.staticItems[n].unitText.c_str());
+}
+
 // Longitude, latitude and orientation of a file, or "none" without a projection.
 void PrintProjection(const XolFile& f) {
     if (f.projection.empty()) {
@@ -79,7 +88,8 @@ int main(int argc, char** argv) {
     std::string output, start, text;
     AscOptions asc;
     CsvOptions csv;
-    int item = 1, step = -1;
+    int item = 1, step = -1, staticItem = 0;
+    bool dynamicChosen = false;  // --item or --step given
     for (int i = 3; i < argc; ++i) {
         const std::string arg = argv[i];
         if (i + 1 >= argc) return Fail("option " + arg + " needs a value");
@@ -119,8 +129,13 @@ int main(int argc, char** argv) {
                 return Fail("--dx needs a positive spacing");
         } else if (arg == "--item") {
             if (!Integer(value, item) || item < 1) return Fail("--item needs a number from 1");
+            dynamicChosen = true;
         } else if (arg == "--step") {
             if (!Integer(value, step) || step < 0) return Fail("--step needs a number from 0");
+            dynamicChosen = true;
+        } else if (arg == "--static") {
+            if (!Integer(value, staticItem) || staticItem < 1)
+                return Fail("--static needs a number from 1");
         } else
             return Fail("unknown option " + arg);
     }
@@ -151,6 +166,7 @@ int main(int argc, char** argv) {
                 }
             }
         XolPrintSummary(f);  // no log is open: the summary goes to standard output
+        PrintStaticItems(f);
         PrintProjection(f);
         XolClose(f);
         return 0;
@@ -161,8 +177,11 @@ int main(int argc, char** argv) {
     else if (command == "import-csv") {
         if (csv.start.empty()) return Fail("--start \"YYYY-MM-DD hh:mm:ss\" is missing");
         text = ImportCsv(input, output, csv);
-    } else
-        text = ExportText(input, output, item, step);
+    } else {
+        if (staticItem > 0 && dynamicChosen)
+            return Fail("--static exports a static item, which has no --item or --step");
+        text = ExportText(input, output, item, step, staticItem);
+    }
     if (!text.empty()) return Fail(text);
     std::printf("%s written\n", output.c_str());
     return 0;

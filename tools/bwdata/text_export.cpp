@@ -1,5 +1,6 @@
-// Data files into plain text: series and lines as CSV, a map at one step as
-// an ESRI ASCII grid or as the columns j,k,value.
+// Data files into plain text: series and lines as CSV, a map at one step (or a
+// static map such as the bathymetry of a result file) as an ESRI ASCII grid or
+// as the columns j,k,value.
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
@@ -61,9 +62,83 @@ bool EndsWith(const std::string& text, const std::string& end) {
            text.compare(text.size() - end.size(), end.size(), end) == 0;
 }
 
+// A CSV field as RFC 4180 has it: in double quotes, with each quote doubled,
+// when it holds a separator, a quote or a line break ("P(3,4): Surface elevation").
+std::string CsvField(const std::string& text) {
+    if (text.find_first_of(",\"\r\n") == std::string::npos) return text;
+    std::string quoted = "\"";
+    for (char c : text) quoted += c == '"' ? std::string("\"\"") : std::string(1, c);
+    return quoted + "\"";
+}
+
+// A map's values as an ESRI ASCII grid (.asc) or as the columns j,k,value (.csv).
+std::string MapText(const XolFile& f, const std::vector<float>& values, const std::string& input,
+                    const std::string& output, std::ostringstream& out) {
+    const int nx = f.axes[0].count, ny = f.axes[1].count;
+    if (EndsWith(output, ".asc")) {
+        if (f.axes[0].spacing != f.axes[1].spacing)
+            return input + ": an ASCII grid needs square cells, the file has dx " +
+                   Value(f.axes[0].spacing, 1e30f) + " and dy " + Value(f.axes[1].spacing, 1e30f);
+        double x0 = 0, y0 = 0;
+        if (std::string e = LowerLeftCentre(f, x0, y0); !e.empty()) return input + ": " + e;
+        out << "ncols " << nx << "\nnrows " << ny << "\nxllcenter " << Fixed(x0) << "\nyllcenter "
+            << Fixed(y0) << "\ncellsize " << Value(f.axes[0].spacing, 1e30f)
+            << "\nNODATA_value -9999\n";
+        for (int k = ny - 1; k >= 0; --k) {  // the northernmost row first
+            for (int j = 0; j < nx; ++j) {
+                const float v = values[static_cast<size_t>(k) * nx + j];
+                out << (j ? " " : "") << (v == f.deleteValue ? "-9999" : Value(v, 1e30f));
+            }
+            out << "\n";
+        }
+        return "";
+    }
+    if (!EndsWith(output, ".csv")) return output + ": a map is exported as .asc or .csv";
+    out << "j,k,value\n";
+    for (int k = 0; k < ny; ++k)
+        for (int j = 0; j < nx; ++j)
+            out << j << "," << k << ","
+                << Value(values[static_cast<size_t>(k) * nx + j], f.deleteValue) << "\n";
+    return "";
+}
+
+// The positions of a line's points, each after a comma: the header of its CSV
+// after the time column.
+std::string LineHeader(const XolFile& f, size_t points) {
+    std::string text;
+    for (size_t p = 0; p < points; ++p)
+        text += "," + Value(f.axes[0].origin + static_cast<float>(p) * f.axes[0].spacing, 1e30f);
+    return text;
+}
+
+// Static item `item` (from 1) of a map or a line: a map as for a step, a line
+// as one row of values under the positions of its points.
+std::string StaticText(XolFile& f, int item, std::vector<float>& values, const std::string& input,
+                       const std::string& output, std::ostringstream& out) {
+    if (item > f.noStaticItems) {
+        std::string names;
+        for (const XolItem& it : f.staticItems) names += (names.empty() ? ": " : ", ") + it.name;
+        return input + ": there is no static item " + std::to_string(item) + " (the file has " +
+               std::to_string(f.noStaticItems) + names + ")";
+    }
+    if (f.dimension == 0) return input + ": the static items of a series file are not exported";
+    for (int n = 1; n <= item; ++n) {
+        int status = 0;
+        XolReadStatic(f, values.data(), &status);
+        if (status != 0) return input + ": " + XolErrorText(status);
+    }
+    if (f.dimension == 2) return MapText(f, values, input, output, out);
+    if (!EndsWith(output, ".csv")) return output + ": a line is exported as .csv";
+    std::string row;
+    for (float v : values) row += "," + Value(v, f.deleteValue);
+    out << LineHeader(f, values.size()).substr(1) << "\n" << row.substr(1) << "\n";
+    return "";
+}
+
 }  // namespace
 
-std::string ExportText(const std::string& input, const std::string& output, int item, int step) {
+std::string ExportText(const std::string& input, const std::string& output, int item, int step,
+                       int staticItem) {
     int status = 0;
     XolFile f = XolOpenRead(input, &status);
     if (status != 0) return input + ": " + XolErrorText(status);
@@ -78,13 +153,20 @@ std::string ExportText(const std::string& input, const std::string& output, int 
         XolClose(f);
         return input + ": files of more than two dimensions are not exported";
     }
+    std::ostringstream out;
+    std::vector<float> values(points);
+    if (staticItem > 0) {
+        const std::string e = StaticText(f, staticItem, values, input, output, out);
+        XolClose(f);
+        if (!e.empty()) return e;
+        if (!WriteTextFile(output, out.str())) return output + ": can't be written";
+        return "";
+    }
     if (f.dimension > 0 && (item < 1 || item > items)) {
         XolClose(f);
         return input + ": there is no item " + std::to_string(item) + " (the file has " +
                std::to_string(items) + ")";
     }
-    std::ostringstream out;
-    std::vector<float> values(points);
     double seconds = f.timeStep;
     if (f.timeUnit != 1400 && !qtyConvertUnit(f.timeUnit, 1400, seconds)) {
         XolClose(f);
@@ -97,11 +179,9 @@ std::string ExportText(const std::string& input, const std::string& output, int 
         }
         out << "time";
         if (f.dimension == 0) {
-            for (const XolItem& it : f.dynamicItems) out << "," << it.name;
+            for (const XolItem& it : f.dynamicItems) out << "," << CsvField(it.name);
         } else {
-            for (size_t p = 0; p < points; ++p)
-                out << ","
-                    << Value(f.axes[0].origin + static_cast<float>(p) * f.axes[0].spacing, 1e30f);
+            out << LineHeader(f, points);
         }
         out << "\n";
         for (int s = 0; s < steps && status == 0; ++s) {
@@ -132,38 +212,11 @@ std::string ExportText(const std::string& input, const std::string& output, int 
                 else
                     XolSkipDynamic(f, &status);
             }
-        const int nx = f.axes[0].count, ny = f.axes[1].count;
-        if (EndsWith(output, ".asc")) {
-            if (f.axes[0].spacing != f.axes[1].spacing) {
+        if (status == 0) {
+            if (std::string e = MapText(f, values, input, output, out); !e.empty()) {
                 XolClose(f);
-                return input + ": an ASCII grid needs square cells, the file has dx " +
-                       Value(f.axes[0].spacing, 1e30f) + " and dy " +
-                       Value(f.axes[1].spacing, 1e30f);
+                return e;
             }
-            double x0 = 0, y0 = 0;
-            if (std::string e = LowerLeftCentre(f, x0, y0); !e.empty()) {
-                XolClose(f);
-                return input + ": " + e;
-            }
-            out << "ncols " << nx << "\nnrows " << ny << "\nxllcenter " << Fixed(x0)
-                << "\nyllcenter " << Fixed(y0) << "\ncellsize " << Value(f.axes[0].spacing, 1e30f)
-                << "\nNODATA_value -9999\n";
-            for (int k = ny - 1; k >= 0; --k) {  // the northernmost row first
-                for (int j = 0; j < nx; ++j) {
-                    const float v = values[static_cast<size_t>(k) * nx + j];
-                    out << (j ? " " : "") << (v == f.deleteValue ? "-9999" : Value(v, 1e30f));
-                }
-                out << "\n";
-            }
-        } else if (EndsWith(output, ".csv")) {
-            out << "j,k,value\n";
-            for (int k = 0; k < ny; ++k)
-                for (int j = 0; j < nx; ++j)
-                    out << j << "," << k << ","
-                        << Value(values[static_cast<size_t>(k) * nx + j], f.deleteValue) << "\n";
-        } else {
-            XolClose(f);
-            return output + ": a map is exported as .asc or .csv";
         }
     }
     XolClose(f);

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <tuple>
 
+#include "data/xolfile.hpp"
 #include "support/test_support.hpp"
 
 namespace fs = std::filesystem;
@@ -83,6 +84,88 @@ TEST_F(DataTool, SeriesAndLinesRoundTrip) {
     Ok({"import-csv", "l.csv", "-o", "l.xol1", "--dx", "5", "--start", "2004-01-01 00:00:00"});
     Ok({"export", "l.xol1", "-o", "l2.csv"});
     EXPECT_EQ(bwtest::ReadFile(dir / "l2.csv"), "time,0,5,10\n0,1,2,3\n0.5,4,5,6\n");
+}
+
+// A result file as the engine writes one: items `names` over `dimension` axes
+// of 3 x 2 points, two steps of values 10 n + s + i / 4, then the static items
+// `statics` of values -(s + 1) - i (s counting from 0), the first on the delete value
+// at point 1.
+std::string WriteResult(const bwtest::TempDir& dir, const std::string& name, int dimension,
+                        const std::vector<std::string>& names,
+                        const std::vector<std::string>& statics) {
+    const std::string path = dir / name;
+    const int items = static_cast<int>(names.size());
+    XolFile f = XolCreateHeader("Result", items, dimension, {.appTitle = "bw"});
+    for (int n = 1; n <= items; ++n) XolSetItem(f, n, 100078, names[n - 1], 1000);
+    if (dimension > 0) XolSetAxis(f, 1, 2.0f, 10.0f, 3);
+    if (dimension > 1) XolSetAxis(f, 2, 2.0f, 20.0f, 2);
+    XolSetCalendarAxis(f, 0.5, "2026-01-01 12:00:00");
+    XolCreateFile(f, path);
+    const size_t points = dimension == 0 ? 1 : dimension == 1 ? 3 : 6;
+    std::vector<float> values(points);
+    for (size_t s = 0; s < statics.size(); ++s) {
+        for (size_t i = 0; i < points; ++i) values[i] = -1.0f - s - i;
+        if (s == 0 && points > 1) values[1] = kDeleteValue;
+        XolWriteStatic(f, values.data(), 100079, statics[s], 1000);
+    }
+    for (int s = 0; s < 2; ++s)
+        for (int n = 1; n <= items; ++n) {
+            for (size_t i = 0; i < points; ++i) values[i] = 10.0f * n + s + 0.25f * i;
+            XolWriteDynamic(f, values.data());
+        }
+    XolClose(f);
+    return path;
+}
+
+// Gauge names hold commas and quotes ("P(3,4): Surface elevation"): such a
+// header field is quoted, quotes doubled, so that every row has as many
+// fields as the header; a plain name stays as it is.
+TEST_F(DataTool, SeriesHeaderQuotesNamesWithCommasAndQuotes) {
+    WriteResult(dir, "gauges.xol0", 0, {"P(3,4): Surface elevation", "Say \"high\"", "Level"}, {});
+    Ok({"export", "gauges.xol0", "-o", "gauges.csv"});
+    EXPECT_EQ(bwtest::ReadFile(dir / "gauges.csv"),
+              "time,\"P(3,4): Surface elevation\",\"Say \"\"high\"\"\",Level\n"
+              "0,10,20,30\n0.5,11,21,31\n");
+}
+
+// The static items of a result file (the bathymetry of a map) are exported by
+// their number: a map as a grid or as columns, a line as one row; info lists
+// them by that number.
+TEST_F(DataTool, StaticItemsAreExportedByTheirNumber) {
+    WriteResult(dir, "map.xol2", 2, {"Surface elevation"}, {"Bathymetry", "Porosity"});
+    EXPECT_TRUE(Has(Run({"info", "map.xol2"}).out,
+                    "  Static item 1: Bathymetry (meter)\n  Static item 2: Porosity (meter)\n"));
+    Ok({"export", "map.xol2", "-o", "bed.asc", "--static", "1"});
+    EXPECT_EQ(bwtest::ReadFile(dir / "bed.asc"),
+              "ncols 3\nnrows 2\nxllcenter 10\nyllcenter 20\ncellsize 2\nNODATA_value -9999\n"
+              "-4 -5 -6\n-1 -9999 -3\n");
+    Ok({"export", "map.xol2", "-o", "porosity.csv", "--static", "2"});
+    EXPECT_EQ(bwtest::ReadFile(dir / "porosity.csv"),
+              "j,k,value\n0,0,-2\n1,0,-3\n2,0,-4\n0,1,-5\n1,1,-6\n2,1,-7\n");
+    // The dynamic item is still what export gives by default.
+    Ok({"export", "map.xol2", "-o", "last.csv"});
+    EXPECT_TRUE(Has(bwtest::ReadFile(dir / "last.csv"), "j,k,value\n0,0,11\n1,0,11.25\n"));
+
+    WriteResult(dir, "axis.xol1", 1, {"Surface elevation"}, {"Bathymetry"});
+    Ok({"export", "axis.xol1", "-o", "axis.csv", "--static", "1"});
+    EXPECT_EQ(bwtest::ReadFile(dir / "axis.csv"), "10,12,14\n-1,,-3\n");
+
+    const std::tuple<std::vector<std::string>, const char*> refusals[] = {
+        {{"map.xol2", "--static", "3"},
+         "there is no static item 3 (the file has 2: Bathymetry, "
+         "Porosity)"},
+        {{"map.xol2", "--static", "1", "--step", "0"}, "--static exports a static item"},
+        {{"map.xol2", "--static", "0"}, "--static needs a number from 1"},
+    };
+    for (const auto& [args, message] : refusals) {
+        std::vector<std::string> all = {"export"};
+        all.insert(all.end(), args.begin(), args.end());
+        all.insert(all.end(), {"-o", "out.csv"});
+        const auto r = Run(all);
+        EXPECT_EQ(r.exitCode, 1) << args[2];
+        EXPECT_TRUE(Has(r.err, message));
+        EXPECT_FALSE(fs::exists(dir / "out.csv"));
+    }
 }
 
 // Bad input is named by file and line, and no output is left, not even a part.

@@ -10,12 +10,13 @@ bwdata=$bin/tools/bwdata/bwdata
 bwplot=$root/tools/bwplot/bwplot
 cd "$here"
 
-# The text inputs, then the bathymetry and the sponge map as data files:
+# The text inputs, then the bathymetry and the sponge map as data files; the
+# sponge map's values are factors, of unit 99000 (dimensionless):
 #   make_maps "title of the bathymetry" "title of the sponge map"
 make_maps() {
     /usr/bin/python3 make_inputs.py
     "$bwdata" import-asc bathymetry.asc -o bathymetry.xol2 --title "$1" >/dev/null
-    "$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 1000 \
+    "$bwdata" import-asc sponge.asc -o sponge.xol2 --name "Sponge" --type 999 --unit 99000 \
         --title "$2" >/dev/null
 }
 

@@ -6,7 +6,7 @@ set -euo pipefail
 . "$(dirname "$0")/../common.sh"
 
 make_maps "Harbour behind a breakwater" "Sponge layer behind the generation line"
-"$bwdata" import-asc codes.asc -o codes.xol2 --name "Area code" --type 999 --unit 1000 \
+"$bwdata" import-asc codes.asc -o codes.xol2 --name "Area code" --type 999 --unit 99000 \
     --title "Areas of the disturbance report" >/dev/null
 "$bwdata" import-csv waves.csv -o waves.xol0 --start "2026-01-01 12:00:00" \
     --types 999 --units 4700 --title "Source of the generation line" >/dev/null

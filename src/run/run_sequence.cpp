@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "input/kvt_access.hpp"
+#include "input/model_check.hpp"
 #include "input/model_setup.hpp"
 #include "run/fpmode.hpp"
 #include "run/messages.hpp"
@@ -37,11 +38,16 @@ void ReadDebugLevel(const char* text, int& debugLevel) {
 
 }  // namespace
 
-std::string ParseArguments(int argc, const char* const* argv, int& debugLevel) {
+std::string ParseArguments(int argc, const char* const* argv, int& debugLevel, bool* check) {
     std::string name;
     for (int i = 1; i < argc; ++i) {
         const char* arg = argv[i];
-        if (std::strncmp(arg, "-debug", 6) == 0) {
+        if (std::strcmp(arg, "-check") == 0) {
+            // An option of its own beside -debug, and like it it blanks the
+            // name read before it.
+            if (check != nullptr) *check = true;
+            name.clear();
+        } else if (std::strncmp(arg, "-debug", 6) == 0) {
             debugLevel = 1;
             if (arg[6] == ':') ReadDebugLevel(arg + 7, debugLevel);
             name.clear();
@@ -67,7 +73,8 @@ std::string ChannelName(std::string_view fileName) {
 void ReadCommandLine(int argc, const char* const* argv) {
     ProcessStart();
     gRun.debugLevel = 0;
-    const std::string fileName = ParseArguments(argc, argv, gRun.debugLevel);
+    gRun.checkOnly = false;
+    const std::string fileName = ParseArguments(argc, argv, gRun.debugLevel, &gRun.checkOnly);
     if (fileName.empty()) StopRun(kUsage);
     gRun.parameterFileName = fileName;
 
@@ -116,6 +123,13 @@ void RunMain(int argc, const char* const* argv) {
     ReadModelSetup(gRun.parameterFileHandle, gRun.parameterFileName);
     // What the file holds and no setting read: mistyped or misplaced keys.
     KvtWarnUnread(gRun.parameterFileHandle);
+    if (gRun.checkOnly) {
+        // bw -check: everything is read and checked; the run ends here.
+        WriteModelCheck();
+        StopTiming(gOverallTiming, kTaskPreProcessing);
+        StopTiming(gOverallTiming, kTaskTotal);
+        Shutdown(gRun.parameterFileName, 0);
+    }
     SetThreads(gProcess.maxThreads);
     StopTiming(gOverallTiming, kTaskPreProcessing);
 

@@ -12,7 +12,10 @@ constexpr const char* kProgramTitle = "TARNEL BW";
 
 // Walks the arguments (argv[1..]) and gives the parameter file name, empty
 // when none is left; an option blanks the name read before it.
-std::string ParseArguments(int argc, const char* const* argv, int& debugLevel);
+// "-check" is an option too: check sets it (where given), and the model is
+// read and checked without a time step.
+std::string ParseArguments(int argc, const char* const* argv, int& debugLevel,
+                           bool* check = nullptr);
 // The stem of the progress channel: the path less its file's extension, as the log's.
 std::string ChannelName(std::string_view fileName);
 

@@ -10,6 +10,7 @@ struct RunState {
     int debugLevel = 0;             // -debug: 1; -debug:N: N. 2 logs boundary tables, 3 grid codes
     std::string parameterFileName;  // the path given on the command line
     KvtHandle parameterFileHandle = 0;
-    int runExitCode = 0;  // 0 while sound; negative once cancelled or blown up
+    int runExitCode = 0;     // 0 while sound; negative once cancelled or blown up
+    bool checkOnly = false;  // -check: read and check the model, compute no step
 };
 extern RunState gRun;

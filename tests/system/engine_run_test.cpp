@@ -7,6 +7,7 @@
 
 #include <chrono>
 #include <filesystem>
+#include <numbers>
 #include <regex>
 #include <thread>
 
@@ -183,9 +184,10 @@ TEST_F(EngineRun, BlowUpsNameThePointAndCloseTheOutputs) {
         EXPECT_EQ(r.exitCode, 255) << c.text << "\n" << r.out;
         const std::string log = bwtest::ReadFile(dir / "m.log");
         // The point and the step.
-        EXPECT_TRUE(std::regex_search(log, std::regex("---------- B L O W  -  U P  detected ---\n" +
-                                                      std::regex_replace(c.text, std::regex("[()]"), "\\$&") +
-                                                      "\nin time step [0-9]+\n\nCOMPUTATION ENDED")))
+        EXPECT_TRUE(std::regex_search(
+            log, std::regex("---------- B L O W  -  U P  detected ---\n" +
+                            std::regex_replace(c.text, std::regex("[()]"), "\\$&") +
+                            "\nin time step [0-9]+\n\nCOMPUTATION ENDED")))
             << c.text;
         EXPECT_TRUE(log.ends_with("\nAbnormal completion\n"));
         // The output was closed: its summary stands in the log and the file opens.
@@ -195,6 +197,57 @@ TEST_F(EngineRun, BlowUpsNameThePointAndCloseTheOutputs) {
         EXPECT_EQ(status, 0);
         if (status == 0) XolClose(f);
     }
+}
+
+// bw -check reads the whole model with its data files and stops before the
+// first step: no output is created, and the log and the screen say how
+// finely the grid resolves the waves of a boundary. A broken model stops as
+// a run would.
+TEST_F(EngineRun, ACheckReadsTheModelAndComputesNoStep) {
+    grid.J = 40, grid.K = 4, grid.dx = grid.dy = 0.25f;
+    WriteBasin([&](std::vector<float>& b) {
+        for (int k = 1; k < grid.K; ++k) b[k * (grid.J + 1)] = -1.0f;  // open to the west
+    });
+    bwtest::WriteSeriesFile(dir / "level.xol0", "2004-01-01 00:00:00", 0.05,
+                            {bwtest::RampedSine(0.01, 2.0, 0.05, 401, 2.0)});
+    const std::string boundary =
+        "Number_Of_Boundaries = 1\nBOUNDARY_DATA_1 {\nFirst_Point = 0, 1\nLast_Point = 0, 3\n"
+        "Formulation = 0\nData_Specification = 0\n" +
+        bwtest::DataFileSection("level.xol0") + "}\n";
+    const std::string period =
+        "Time_step_count = 400\nTime_step_interval = 0.05\nStart_time = 2004, 1, 1, 0, 0, 0\n";
+    const std::string output =
+        "Number_Of_Records = 1\nOutput_Spec_Data_1 {\nFile_Name = file(\"out.xol2\")\n"
+        "X_Range_And_Interval = 0, 40, 1\nY_Range_And_Interval = 0, 4, 1\nFirst_Time_step = 1\n"
+        "Last_Time_step = 400\nItem_Numbers = 1\n}\n";
+    const std::string text = ModelText("bed.xol2", {{"Simulation_Period", period},
+                                                    {"Boundary_Location", boundary},
+                                                    {"Output_Deterministic_2D", output}});
+    RunResult r = RunModel(text, "-check");
+    EXPECT_EQ(r.exitCode, 0) << r.out;
+    // 1 m deep, T = 2 s: kh = 1.2303 by the equations without deep-water terms.
+    const double L = 2 * std::numbers::pi / 1.2303;
+    std::smatch m;
+    ASSERT_TRUE(std::regex_search(
+        r.out, m,
+        std::regex("Boundary 1 \\(west, level\\): period ([0-9.]+) s, depth 1 m, wavelength "
+                   "([0-9.]+) m: ([0-9.]+) points per wavelength \\(spacing 0.25 m\\), ([0-9.]+) "
+                   "steps per period\n")))
+        << r.out;
+    EXPECT_NEAR(std::stod(m[1]), 2.0, 0.01);
+    EXPECT_NEAR(std::stod(m[2]), L, 0.01 * L);
+    EXPECT_NEAR(std::stod(m[3]), L / 0.25, 0.2);
+    EXPECT_NEAR(std::stod(m[4]), 40.0, 0.2);
+    const std::string log = bwtest::ReadFile(dir / "m.log");
+    EXPECT_NE(log.find("Model Check"), std::string::npos);
+    EXPECT_TRUE(log.ends_with("\nSuccessful completion\n"));
+    EXPECT_FALSE(fs::exists(dir / "out.xol2"));
+
+    // The option blanks a name before it, as -debug does; a broken model stops.
+    EXPECT_EQ(Run({"m.bw", "-check"}).out, "Usage: bw [//hud] [options] kvt-file\n");
+    r = RunModel(ModelText("absent.xol2"), "-check");
+    EXPECT_EQ(r.exitCode, 1);
+    EXPECT_TRUE(bwtest::ReadFile(dir / "m.log").ends_with("\nAbnormal completion\n"));
 }
 
 TEST_F(EngineRun, AKillFileCancelsTheTimeLoopAndTheOutputsAreClosed) {

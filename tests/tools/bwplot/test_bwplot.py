@@ -1,6 +1,7 @@
 #!/usr/bin/python3
 """Tests of bwplot: it writes small result files of each kind and draws them."""
 
+import argparse
 import concurrent.futures
 import contextlib
 import io
@@ -17,6 +18,7 @@ try:
 
     matplotlib.use("Agg")
     import matplotlib.image
+    import matplotlib.pyplot
     import netCDF4
     import numpy as np
 except ImportError as e:
@@ -28,14 +30,15 @@ BWPLOT = os.path.normpath(os.path.join(os.path.dirname(os.path.abspath(__file__)
 FILL = np.float32(-1e-30)
 
 
-def write(path, title, nt, axes, items):
-    """A result file; `items` holds (name, long name, dims, kind, values)."""
+def write(path, title, nt, axes, items, units="seconds since 2026-01-01 12:00:00", first=0.0):
+    """A result file; `items` holds (name, long name, dims, kind, values); its
+    records lie 0.5 s apart from `first` seconds after the time axis's reference."""
     with netCDF4.Dataset(path, "w", format="NETCDF4") as ds:
         ds.setncatts({"title": title, "delete_value": FILL, "time_step": 0.5})
         ds.createDimension("time", None)
         t = ds.createVariable("time", "f8", ("time",))
-        t.units = "seconds since 2026-01-01 12:00:00"
-        t[:] = 0.5 * np.arange(nt)
+        t.units = units
+        t[:] = first + 0.5 * np.arange(nt)
         for name, n in axes.items():
             ds.createDimension(name, n)
             ds.createVariable(name, "f8", (name,))[:] = 10.0 + 2.0 * np.arange(n)
@@ -144,6 +147,48 @@ class BwplotTest(unittest.TestCase):
         # The bare delete value is masked even when netCDF4 has not masked it.
         m = self.bw["masked"](np.array([0.5, -1e-30, -2e-30, 0.0], dtype="f4"), -1e-30)
         self.assertEqual(list(np.ma.getmaskarray(m)), [False, True, False, False])
+
+    def test_times_count_from_the_reference_time(self):
+        # bw writes a line file's first record at the reference time of its axis (12:00:01
+        # here), a map's and a series' one step after it: the labels are the times the file
+        # holds, from the reference time, never from the first record.
+        line = np.zeros((3, 4), dtype="f4")
+        points = [("P_Surface_elevation", "P(1,1): Surface elevation", ("time",), "dynamic",
+                   np.zeros(3, dtype="f4"))]
+        write(os.path.join(self.dir, "late.xol1"), "Late line", 3, {"x": 4},
+              [("Surface_elevation", "Surface elevation", ("time", "x"), "dynamic", line)],
+              units="seconds since 2026-01-01 12:00:01")
+        write(os.path.join(self.dir, "relative.xol1"), "Relative line", 3, {"x": 4},
+              [("Surface_elevation", "Surface elevation", ("time", "x"), "dynamic", line)],
+              units="s", first=1.0)
+        write(os.path.join(self.dir, "late.xol0"), "Late gauges", 3, {}, points, first=1.0)
+        write(os.path.join(self.dir, "relative.xol0"), "Relative gauges", 3, {}, points,
+              units="s", first=1.0)
+        args = argparse.Namespace(
+            item=None, step=None, steps="0,2", mark_points=None, mark_line=None)
+        for name, labels in (("late.xol1", ["2026-01-01 12:00:01", "2026-01-01 12:00:02"]),
+                             ("relative.xol1", ["t = 1 s", "t = 2 s"])):
+            with self.subTest(name), netCDF4.Dataset(os.path.join(self.dir, name)) as ds:
+                fig, ax = matplotlib.pyplot.subplots()
+                self.bw["draw_line"](ds, args, fig, ax)
+                self.assertEqual([t.get_text() for t in ax.get_legend().get_texts()], labels)
+                matplotlib.pyplot.close(fig)
+        args.steps = None
+        for name, label in (("late.xol0", "time (s since 2026-01-01 12:00:00)"),
+                            ("relative.xol0", "time (s)")):
+            with self.subTest(name), netCDF4.Dataset(os.path.join(self.dir, name)) as ds:
+                fig, ax = matplotlib.pyplot.subplots()
+                self.bw["draw_points"](ds, args, fig, ax)
+                self.assertEqual(ax.get_xlabel(), label)
+                self.assertEqual(list(ax.get_lines()[0].get_xdata()), [1.0, 1.5, 2.0])
+                matplotlib.pyplot.close(fig)
+        # A map's title: its last record, 2 s after the reference.
+        with netCDF4.Dataset(os.path.join(self.dir, "basin.xol2")) as ds:
+            fig, ax = matplotlib.pyplot.subplots()
+            args.step, args.steps = -1, None
+            self.assertEqual(self.bw["draw_area"](ds, args, fig, ax),
+                             "Surface elevation, 2026-01-01 12:00:02")
+            matplotlib.pyplot.close(fig)
 
 
 if __name__ == "__main__":

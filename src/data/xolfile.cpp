@@ -695,6 +695,7 @@ void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
 void ReadItems(XolFile& f, int32_t item, float* values) {
     for (int32_t n = 1; n <= item; ++n) XolReadDynamic(f, values);
     XolCheckFinite(f, values);
+    XolNoteItemRange(f, item, values);
     XolClose(f);
 }
 
@@ -708,21 +709,44 @@ void CheckDimension(const XolFile& f, int wanted, const char* text, const char* 
 
 }  // namespace
 
+// The summary of a map follows its reading, so that it gives the range of
+// the item read; a map that does not fit stops before with its file named.
 void ReadGridFile1D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
     XolFile f = XolOpenRead(path);
-    XolPrintSummary(f);
     CheckDimension(f, 1, "XOL data is not 1D", "a map of the 1DH model");
     CheckAxis(f, 1, grid.dx, grid.J);
     ReadItems(f, item, values);
+    XolPrintSummary(f);
 }
 
 void ReadGridFile2D(const std::string& path, int32_t item, float* values, const GridShape& grid) {
     XolFile f = XolOpenRead(path);
-    XolPrintSummary(f);
     CheckDimension(f, 2, "ERR_XOL_NOT2D", "a map");
     CheckAxis(f, 1, grid.dx, grid.J);
     CheckAxis(f, 2, grid.dy, grid.K);
     ReadItems(f, item, values);
+    XolPrintSummary(f);
+}
+
+void XolNoteItemRange(XolFile& f, int32_t item, const float* values) {
+    if (item < 1 || item > static_cast<int32_t>(f.dynamicItems.size())) return;
+    XolItem& it = f.dynamicItems[static_cast<size_t>(item - 1)];
+    const size_t n = XolItemValues(f);
+    double low = 0.0, high = 0.0;
+    int32_t missing = 0;
+    bool any = false;
+    for (size_t i = 0; i < n; ++i) {
+        const float v = values[i];
+        if (v == f.deleteValue) {
+            ++missing;
+            continue;
+        }
+        low = any ? std::min(low, static_cast<double>(v)) : v;
+        high = any ? std::max(high, static_cast<double>(v)) : v;
+        any = true;
+    }
+    if (any) it.minimum = low, it.maximum = high;
+    it.missing = missing;
 }
 
 std::string MapValueAt(const std::string& path, float value, size_t index, int32_t J) {

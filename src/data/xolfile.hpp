@@ -175,6 +175,10 @@ void ReadGridFile2D(const std::string& path, int32_t item, float* values, const 
 std::string XolAxesFound(const XolFile& file);
 std::string XolItemsFound(const XolFile& file, const std::string& wanted);
 std::string XolSpacingFound(float found, float grid);
+// Puts the range of an item just read (its values, the delete value left
+// out) into the record, for the summary of a file read: a file that is only
+// read has no range from the library.
+void XolNoteItemRange(XolFile& file, int32_t item, const float* values);
 // What a map's range check names behind its own text: ": <path>: <value> at
 // point (j,k)", index counting x fastest over a grid of highest x index J.
 std::string MapValueAt(const std::string& path, float value, size_t index, int32_t J);

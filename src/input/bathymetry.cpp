@@ -67,7 +67,6 @@ void ReadBathymetry(KvtHandle target) {
     // grid file here, never a mesh file with a table of positions.
     CheckOpens(b.fileName);
     XolFile f = XolOpenRead(b.fileName);
-    XolPrintSummary(f);
 
     GridState& g = gGrid;
     const bool twoD = gBasic.numberOfDimensions == 2;
@@ -118,6 +117,9 @@ void ReadBathymetry(KvtHandle target) {
         XolReadDynamic(f, item.data());
     }
     XolCheckFinite(f, item.data());
+    // The summary follows the reading, with the range of the bed read.
+    XolNoteItemRange(f, b.hotStart ? 2 : b.itemNumbers[0], item.data());
     XolClose(f);
+    XolPrintSummary(f);
     std::copy(item.begin(), item.begin() + static_cast<ptrdiff_t>(g.Points()), g.bed.begin());
 }

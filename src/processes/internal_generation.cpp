@@ -178,6 +178,16 @@ void ReadRecord(KvtHandle parent, int32_t number, InternalGenRecord& r) {
         r.pointK = {first[1]};
         return;
     }
+    // A check the reader adds: the points of the line index the grid's
+    // fields, so a line that leaves the grid can't be generated on.
+    const GridState& grid = gGrid;
+    for (const int32_t* end : {first, last})
+        if (end[0] < 0 || end[0] > grid.J || end[1] < 0 || end[1] > grid.K)
+            StopRun(Filled(Filled(Filled("SetupInternalGeneration: generation line % has a point "
+                                         "outside the grid (0..%,0..%)",
+                                         number),
+                                  grid.J),
+                           grid.K));
     r.pointCount = std::max(std::abs(first[0] - last[0]), std::abs(first[1] - last[1]));
     const int32_t np = r.pointCount;
     const float m = static_cast<float>(std::max(np, 1));

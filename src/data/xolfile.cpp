@@ -693,6 +693,7 @@ void CheckAxis(const XolFile& f, int axis, float spacing, int32_t last) {
 
 // Reads items 1 to item, so that the selected one stays in values, and checks it.
 void ReadItems(XolFile& f, int32_t item, float* values) {
+    XolCheckItemNumber(f, item);
     for (int32_t n = 1; n <= item; ++n) XolReadDynamic(f, values);
     XolCheckFinite(f, values);
     XolNoteItemRange(f, item, values);
@@ -777,4 +778,11 @@ std::string XolSpacingFound(float found, float grid) {
     std::snprintf(text, sizeof text, "spacing %.7g where the grid has %.7g",
                   static_cast<double>(found), static_cast<double>(grid));
     return text;
+}
+
+void XolCheckItemNumber(const XolFile& file, int32_t item) {
+    if (item >= 1 && item <= file.noDynamicItems) return;
+    XolStopOnContent("Item_Numbers = " + std::to_string(item) + " selects no item", file,
+                     "it holds " + std::to_string(file.noDynamicItems) +
+                         (file.noDynamicItems == 1 ? " item" : " items") + ", numbered from 1");
 }

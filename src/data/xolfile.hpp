@@ -175,6 +175,11 @@ void ReadGridFile2D(const std::string& path, int32_t item, float* values, const 
 std::string XolAxesFound(const XolFile& file);
 std::string XolItemsFound(const XolFile& file, const std::string& wanted);
 std::string XolSpacingFound(float found, float grid);
+// A check the readers of maps and of the bathymetry add: the item number of
+// a DATA_FILE section must select one of the file's items (0 would read none
+// and leave the field as it was; a number beyond them would read into the
+// next step).
+void XolCheckItemNumber(const XolFile& file, int32_t item);
 // Puts the range of an item just read (its values, the delete value left
 // out) into the record, for the summary of a file read: a file that is only
 // read has no range from the library.

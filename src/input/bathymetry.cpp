@@ -106,6 +106,7 @@ void ReadBathymetry(KvtHandle target) {
     }
     if (!b.hotStart) {
         // Items 1 to the selected one, so that the selected item stays.
+        XolCheckItemNumber(f, b.itemNumbers[0]);
         for (int32_t n = 1; n <= b.itemNumbers[0]; ++n) XolReadDynamic(f, item.data());
     } else {
         if (f.dataType != kHotStartDataType)

@@ -117,6 +117,12 @@ void SetupExplicitFilter(KvtHandle target) {
     }
     if (f.type == 1) {
         KvtGetReal(section, "filter_coeff", f.filterCoeff);
+        // The constant is held to the range of the map's values.
+        if (f.filterCoeff < 0.0f || f.filterCoeff > 1.0f)
+            StopRun(
+                Filled("_SetupExplicitFilter: filter coefficient outside interval 0<=f<=1: "
+                       "filter_coeff = %",
+                       f.filterCoeff));
         if (twoD) f.filterCoef.assign(g.Points(), f.filterCoeff);
     } else if (f.type == 2) {
         const DataFileRef ref = ReadDataFile(section, 3);

@@ -6,7 +6,7 @@
 
 namespace {
 
-enum class Dimension { None, Length, Time, Velocity, FluxPerWidth, Ratio };
+enum class Dimension { None, Length, PerLength, Time, Velocity, FluxPerWidth, Ratio };
 
 struct UnitRecord {
     int code;
@@ -22,6 +22,9 @@ constexpr UnitRecord kUnits[] = {
     {1001, "kilometer", "km", Dimension::Length, 1000.0},
     {1002, "millimeter", "mm", Dimension::Length, 0.001},
     {1003, "feet", "ft", Dimension::Length, 0.3048},
+    // The curvature of the surface that boundaries with the deep-water terms take.
+    {1050, "1/meter", "m-1", Dimension::PerLength, 1.0},
+    {1051, "1/feet", "ft-1", Dimension::PerLength, 1.0 / 0.3048},
     {1400, "sec", "s", Dimension::Time, 1.0},
     {1401, "minute", "min", Dimension::Time, 60.0},
     {1402, "hour", "h", Dimension::Time, 3600.0},

@@ -38,7 +38,10 @@ TEST(Quantities, ConversionWithinOneDimensionAndCfTexts) {
         int from, to;
         double in, out;
     } cases[] = {
-        {1003, 1000, 10.0, 3.048}, {1402, 1400, 2.0, 7200.0}, {2002, 2000, 3600.0, 1852.0}};
+        {1003, 1000, 10.0, 3.048},
+        {1402, 1400, 2.0, 7200.0},
+        {2002, 2000, 3600.0, 1852.0},
+        {1051, 1050, 0.3048, 1.0}};  // a curvature of 0.3048 per foot is 1 per metre
     for (const auto& c : cases) {
         double v = c.in;
         EXPECT_TRUE(qtyConvertUnit(c.from, c.to, v)) << c.from;
@@ -48,7 +51,7 @@ TEST(Quantities, ConversionWithinOneDimensionAndCfTexts) {
     EXPECT_FALSE(qtyConvertUnit(1000, 1400, v));
     EXPECT_FALSE(qtyConvertUnit(1000, 12345, v));
     EXPECT_EQ(v, 5.0);
-    for (int unit : {1000, 1003, 1400, 1402, 2000, 4700, 99000})
+    for (int unit : {1000, 1003, 1050, 1400, 1402, 2000, 4700, 99000})
         EXPECT_EQ(qtyUnitFromCf(qtyGetCfUnit(unit)), unit) << unit;
     EXPECT_EQ(qtyUnitFromCf("metres"), 1000);
     EXPECT_EQ(qtyUnitFromCf("m  s-1"), 2000);

@@ -275,28 +275,32 @@ bool kvtIsKeyword(KvtHandle node) {
     return tree->nodes[index].kind == KvtNodeKind::Keyword;
 }
 
-int kvtGetLevel(KvtHandle node) {
+namespace {
+
+// A target, section or keyword, with the error code cleared; nullptr (and
+// the code of Node) for any other handle.
+const KvtNode* NamedNode(KvtHandle node) {
     const KvtNode* n =
         Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword});
-    if (n == nullptr) return 0;
-    KvtSetError(kKvtOk);
-    return n->level;
+    if (n != nullptr) KvtSetError(kKvtOk);
+    return n;
+}
+
+}  // namespace
+
+int kvtGetLevel(KvtHandle node) {
+    const KvtNode* n = NamedNode(node);
+    return n != nullptr ? n->level : 0;
 }
 
 int kvtGetLine(KvtHandle node) {
-    const KvtNode* n =
-        Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword});
-    if (n == nullptr) return 0;
-    KvtSetError(kKvtOk);
-    return n->line;
+    const KvtNode* n = NamedNode(node);
+    return n != nullptr ? n->line : 0;
 }
 
 bool kvtIsRead(KvtHandle node) {
-    const KvtNode* n =
-        Node(node, {KvtNodeKind::Target, KvtNodeKind::Section, KvtNodeKind::Keyword});
-    if (n == nullptr) return false;
-    KvtSetError(kKvtOk);
-    return n->read;
+    const KvtNode* n = NamedNode(node);
+    return n != nullptr && n->read;
 }
 
 const char* kvtGetAskedName(KvtHandle node, int number, bool* keyword) {

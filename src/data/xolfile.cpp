@@ -283,6 +283,7 @@ int DefineItem(XolFile& f, XolHandle handle, const XolItem& item, std::string& w
         why += LibraryReason();
         return kXolBadAxis;
     }
+    for (const XolAttribute& attribute : item.attributes) xolSetItemAttribute(handle, attribute);
     why.clear();
     return 0;
 }
@@ -496,6 +497,11 @@ void XolSetItem(XolFile& f, int32_t n, int32_t type, const std::string& name, in
                         std::to_string(f.noDynamicItems) + " items");
     f.dynamicItems[static_cast<size_t>(n - 1)] = MakeItem(type, name, unit);
     Succeed(status);
+}
+
+void XolSetItemAttribute(XolFile& f, int32_t n, const XolAttribute& attribute) {
+    if (n >= 1 && n <= f.noDynamicItems)
+        f.dynamicItems[static_cast<size_t>(n - 1)].attributes.push_back(attribute);
 }
 
 void XolSetCalendarAxis(XolFile& f, double step, const std::string& start, int32_t timeUnit,

@@ -37,6 +37,7 @@ struct XolItem {
     int32_t missing = kUnsetInteger;
     std::string typeText = "Unknown";
     std::string unitText = "Unknown";
+    std::vector<XolAttribute> attributes;  // further attributes a file written gets
 };
 
 struct XolFile {
@@ -139,6 +140,9 @@ XolFile XolCreateHeader(const std::string& title, int32_t items, int32_t dimensi
                         const XolHeaderOptions& options = {}, int* status = nullptr);
 void XolSetItem(XolFile& file, int32_t item, int32_t type, const std::string& name, int32_t unit,
                 int* status = nullptr);
+// An attribute of item's variable in the file written: a CF standard name, the
+// place of a point. Set after XolSetItem, before XolCreateFile.
+void XolSetItemAttribute(XolFile& file, int32_t item, const XolAttribute& attribute);
 // start: "YYYY-MM-DD hh:mm:ss"; startOffset: seconds from it to the first
 // record (a start between whole seconds).
 void XolSetCalendarAxis(XolFile& file, double step, const std::string& start,

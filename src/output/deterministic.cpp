@@ -14,18 +14,23 @@
 
 DeterministicOutput gOutputDet;
 
-const OutputItemInfo kDeterministicItems[12] = {{"Surface elevation", 100078, 1000},
-                                                {"Water depth", 100280, 1000},
-                                                {"P flux", 100080, 4700},
-                                                {"Q flux", 100080, 4700},
-                                                {"Roller thickness", 100299, 1000},
-                                                {"Roller angle", 999, 1000},
-                                                {"Roller celerity, cx", 100016, 2000},
-                                                {"Roller celerity, cy", 100016, 2000},
-                                                {"Still water depth", 100280, 1000},
-                                                {"Water level (roller)", 100000, 1000},
-                                                {"U velerity", 100016, 2000},
-                                                {"V velerity", 100016, 2000}};
+// The surface above the datum of the bed levels, a level surface. Bed levels
+// ("Still water depth", negative in water) have no standard name of that sign.
+constexpr const char* kSurfaceHeight = "sea_surface_height_above_geopotential_datum";
+
+const OutputItemInfo kDeterministicItems[12] = {
+    {"Surface elevation", 100078, 1000, kSurfaceHeight},
+    {"Water depth", 100280, 1000, "sea_floor_depth_below_sea_surface"},
+    {"P flux", 100080, 4700},
+    {"Q flux", 100080, 4700},
+    {"Roller thickness", 100299, 1000},
+    {"Roller angle", 999, 1000},
+    {"Roller celerity, cx", 100016, 2000},
+    {"Roller celerity, cy", 100016, 2000},
+    {"Still water depth", 100280, 1000},
+    {"Water level (roller)", 100000, 1000},
+    {"U velerity", 100016, 2000, "sea_water_x_velocity"},
+    {"V velerity", 100016, 2000, "sea_water_y_velocity"}};
 
 namespace {
 
@@ -242,6 +247,21 @@ void SetStepTimeAxis(XolFile& file, int32_t startStep, int32_t stepInterval) {
     XolSetCalendarAxis(file, stepInterval * g.dt, DateTimeText(start), 1400, fraction);
 }
 
+// Where the point of an item of a point file lies: grid index, metres on the
+// grid and, for a grid on a map projection, projected and geographic position.
+void SetPointPosition(XolFile& file, int32_t item, const OutputSubGrid& at) {
+    const GridState& g = gGrid;
+    const double x = at.j0 * static_cast<double>(g.dx), y = at.k0 * static_cast<double>(g.dy);
+    XolSetItemAttribute(file, item, {"grid_index", "", {double(at.j0), double(at.k0)}});
+    XolSetItemAttribute(file, item, {"position", "", {x, y}});
+    if (g.frame == 0 || GeoIsNone(g.projection)) return;
+    double east = 0.0, north = 0.0, lon = 0.0, lat = 0.0;
+    GeoFrameXy2Proj(g.frame, x, y, east, north);
+    GeoFrameXy2Geo(g.frame, x, y, lon, lat);
+    XolSetItemAttribute(file, item, {"projected_position", "", {east, north}});
+    XolSetItemAttribute(file, item, {"geographic_position", "", {lon, lat}});
+}
+
 GridPlace SetGridProjection(XolFile& file, double x, double y) {
     const GridState& g = gGrid;
     GridPlace place;
@@ -279,7 +299,11 @@ void CreateOutputRecordFile(OutputRecord2D& r, const OutputItemInfo* table, int3
                 // The filling trims the blank behind the colon; it is put back.
                 name = Filled("P(%,", q.j0) + Filled("%):", q.k0) + " " + name;
             }
-            XolSetItem(r.file, n++, info.type, name, info.unit);
+            XolSetItem(r.file, n, info.type, name, info.unit);
+            if (info.standardName != nullptr)
+                XolSetItemAttribute(r.file, n, {"standard_name", info.standardName, {}});
+            if (r.dimension == 0) SetPointPosition(r.file, n, RecordSubGrid(r, p));
+            ++n;
         }
     }
     SetStepTimeAxis(r.file, startStep, stepInterval);

@@ -51,6 +51,7 @@ struct OutputItemInfo {
     const char* name;
     int32_t type;
     int32_t unit;
+    const char* standardName = nullptr;  // the CF standard name, where one fits
 };
 // The twelve items of the deterministic output, item n at index n - 1.
 extern const OutputItemInfo kDeterministicItems[12];

@@ -19,7 +19,7 @@
 DisturbanceState gDisturbance;
 
 const OutputItemInfo kDisturbanceItemInfo[kDisturbanceItemCount] = {
-    {"Hm0", 100097, 1000},
+    {"Hm0", 100097, 1000, "sea_surface_wave_significant_height"},
     {"Hm0/Hm0_incoming", 100106, 99000},
     {"Time of first wave", 100107, 1400}};
 
@@ -203,7 +203,10 @@ void CreateOutputDisturbance() {
     for (int32_t item : d.itemNumbers) {
         if (item < 1 || item > kDisturbanceItemCount) StopRun(kWrongItem);
         const OutputItemInfo& info = kDisturbanceItemInfo[item - 1];
-        XolSetItem(s.file, n++, info.type, info.name, info.unit);
+        XolSetItem(s.file, n, info.type, info.name, info.unit);
+        if (info.standardName != nullptr)
+            XolSetItemAttribute(s.file, n, {"standard_name", info.standardName, {}});
+        ++n;
     }
     SetStepTimeAxis(s.file, d.firstStep + d.stepInterval, d.stepInterval);
     XolSetMisc(s.file, 4, g.landValue);

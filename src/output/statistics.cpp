@@ -13,8 +13,8 @@
 StatisticState gStatistics;
 
 const OutputItemInfo kStatisticItems[kStatisticItemCount] = {
-    {"Significant wave height", 100097, 1000},
-    {"Max. wave height", 100078, 1000},
+    {"Significant wave height", 100097, 1000, "sea_surface_wave_significant_height"},
+    {"Max. wave height", 100078, 1000, "sea_surface_wave_maximum_height"},
     {"Max. elevation", 100078, 1000},
     {"Min. elevation", 100078, 1000},
     {"Mean elevation", 100078, 1000},

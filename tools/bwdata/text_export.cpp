@@ -35,12 +35,14 @@ std::string Fixed(double v) {
 }
 
 // Where the centre of the grid's lower-left cell lies on the map: the axis
-// origins in model coordinates, moved to the projection by the file's frame.
-// An ASCII grid can't be turned, so a turned grid has no such place.
+// origins where the file has no place, else its first point, which lies at the
+// file's longitude and latitude. An ASCII grid can't be turned, so a turned
+// grid has no such place.
 std::string LowerLeftCentre(const XolFile& f, double& x, double& y) {
     x = f.axes[0].origin;
     y = f.axes[1].origin;
     if (f.projection.empty()) return "";
+    x = y = 0.0;
     GeoHandle frame = 0;
     int status = 0;
     GeoFrameOpen(frame, f.projection, f.longitude, f.latitude, f.orientation, &status);

@@ -8,6 +8,8 @@
 #include <map>
 #include <memory>
 
+#include "platform/geo/geo_internal.hpp"
+
 namespace {
 
 constexpr double kDegree = 3.14159265358979323846 / 180.0;
@@ -19,9 +21,14 @@ struct Frame {
     PJ* horizontal = nullptr;  // its projected part: the map projection itself
     PJ* transform = nullptr;   // geographic (lon, lat on WGS 84) to projected (east, north)
     PJ* toBase = nullptr;      // projected to lon, lat on the projection's own datum
-    double longitude = 0.0, latitude = 0.0, orientation = 0.0;
+    double longitude = 0.0, latitude = 0.0;
+    double orientation = 0.0;  // degrees clockwise from projection north to the grid's y axis
     double east0 = 0.0, north0 = 0.0;  // the origin, projected
 };
+
+// A turn of the grid on its map below this many degrees is round-off of the
+// meridian convergence (0.2 mm over 100 km), and the grid lies unturned.
+constexpr double kNoTurn = 1e-7;
 
 void Release(Frame& f) {
     for (PJ* p : {f.crs, f.horizontal, f.transform, f.toBase}) proj_destroy(p);
@@ -99,8 +106,6 @@ PJ* Normalized(PJ* operation) {
     return normal;
 }
 
-// The projected part of a CRS: a CRS with a datum shift to WGS 84 without the
-// shift, a horizontal CRS with a height without the height. A new object.
 PJ* Horizontal(const PJ* crs) {
     PJ* h = proj_clone(Context(), crs);
     for (;;) {
@@ -157,7 +162,33 @@ int MakeProjection(Frame& f, const std::string& text) {
     return 0;
 }
 
+// PROJ's meridian convergence at a projected point, in degrees: the angle
+// from true north to projection north, positive where projection north lies
+// east of true north. The factors of a projection are taken at the point's
+// longitude and latitude on the projection's own datum, not on WGS 84.
+int Convergence(const Frame& f, double east, double north, double& degrees) {
+    PJ_COORD c = proj_trans(f.toBase, PJ_FWD, proj_coord(east, north, 0, 0));
+    if (!std::isfinite(c.lp.lam) || !std::isfinite(c.lp.phi))
+        return Fail(kGeoErrTransform, "the point can't be unprojected");
+    const PJ_FACTORS factors =
+        proj_factors(f.horizontal, proj_coord(proj_torad(c.lp.lam), proj_torad(c.lp.phi), 0, 0));
+    if (proj_errno(f.horizontal) != 0) {
+        proj_errno_reset(f.horizontal);
+        return Fail(kGeoErrTransform, "no meridian convergence at the point");
+    }
+    degrees = factors.meridian_convergence / kDegree;
+    return 0;
+}
+
 }  // namespace
+
+PJ_CONTEXT* GeoContext() {
+    return Context();
+}
+
+PJ* GeoHorizontal(const PJ* crs) {
+    return Horizontal(crs);
+}
 
 bool GeoIsNone(const std::string& projection) {
     const std::string p = Upper(Trimmed(projection));
@@ -191,7 +222,6 @@ int GeoOpen(GeoHandle* handle, const std::string& projection, double longitude, 
     f->longitude = longitude;
     f->latitude = latitude;
     f->none = GeoIsNone(projection);
-    f->orientation = f->none ? 0.0 : orientation;
     if (!f->none) {
         if (int code = MakeProjection(*f, f->projection)) {
             Release(*f);
@@ -201,6 +231,17 @@ int GeoOpen(GeoHandle* handle, const std::string& projection, double longitude, 
     if (int code = Forward(*f, longitude, latitude, f->east0, f->north0)) {
         Release(*f);
         return code;
+    }
+    if (!f->none) {
+        // The orientation given is from true north; the grid turns on its map
+        // by that less the meridian convergence at its origin.
+        double convergence = 0.0;
+        if (int code = Convergence(*f, f->east0, f->north0, convergence)) {
+            Release(*f);
+            return code;
+        }
+        f->orientation = orientation - convergence;
+        if (std::fabs(f->orientation) < kNoTurn) f->orientation = 0.0;
     }
     *handle = gNext++;
     gFrames[*handle] = std::move(f);
@@ -270,22 +311,20 @@ int GeoTrueNorth(GeoHandle h, double x, double y, double& degrees) {
     if (!f->none) {
         double east = 0, north = 0;
         GeoXy2Proj(h, x, y, east, north);
-        // The factors of a projection are taken at the point's longitude and
-        // latitude on the projection's own datum, not on WGS 84.
-        PJ_COORD c = proj_trans(f->toBase, PJ_FWD, proj_coord(east, north, 0, 0));
-        if (!std::isfinite(c.lp.lam) || !std::isfinite(c.lp.phi))
-            return Fail(kGeoErrTransform, "the point can't be unprojected");
-        // PROJ's meridian convergence: the angle from true north to projection
-        // north, positive where projection north lies east of true north.
-        const PJ_FACTORS factors = proj_factors(
-            f->horizontal, proj_coord(proj_torad(c.lp.lam), proj_torad(c.lp.phi), 0, 0));
-        if (proj_errno(f->horizontal) != 0) {
-            proj_errno_reset(f->horizontal);
-            return Fail(kGeoErrTransform, "no meridian convergence at the point");
-        }
-        convergence = factors.meridian_convergence / kDegree;
+        if (int code = Convergence(*f, east, north, convergence)) return code;
     }
-    degrees = -f->orientation - convergence;
+    degrees = f->orientation + convergence;
+    return 0;
+}
+
+int GeoOrientationOnMap(const std::string& projection, double longitude, double latitude,
+                        double turn, double& orientation) {
+    orientation = 0.0;
+    GeoHandle h = 0;
+    if (int code = GeoOpen(&h, projection, longitude, latitude, 0.0)) return code;
+    const Frame* f = Find(h);
+    orientation = f->none ? 0.0 : turn - f->orientation;  // the frame turned by -convergence
+    GeoClose(h);
     return 0;
 }
 

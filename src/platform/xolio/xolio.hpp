@@ -1,5 +1,5 @@
 // The data-file library: gridded, time-stepped files of 32-bit items, kept in
-// NetCDF (classic 64-bit data format, CF conventions) so that every file the
+// NetCDF (classic format with 64-bit offsets, CF conventions) so that every file the
 // engine reads or writes opens in the tools of the field.
 //
 // A file has a header (titles, delete value, data-type flag, time axis,
@@ -15,6 +15,7 @@
 
 #include <cstdint>
 #include <string>
+#include <vector>
 
 using XolHandle = uint64_t;
 
@@ -36,6 +37,14 @@ constexpr int kXolAxisEq4 = 11;
 constexpr int kXolTimeRelative = 1;
 constexpr int kXolTimeCalendar = 3;
 
+// A further attribute of an item's variable (a CF standard name, the place of
+// a point): a text, or numbers.
+struct XolAttribute {
+    std::string name;
+    std::string text;
+    std::vector<double> values;
+};
+
 // The last failure's text.
 const char* xolLastErrorText();
 
@@ -56,6 +65,8 @@ XolHandle xolItemD(XolHandle header, int n);
 int xolSetItemInfo(XolHandle item, int type, const std::string& name, int unit, int dataType);
 // Values pass in this unit: written values are converted to the item's unit,
 // read values from it. Mode 3 is the only mode.
+// Adds an attribute to the item's variable, or replaces the one of that name.
+int xolSetItemAttribute(XolHandle item, const XolAttribute& attribute);
 int xolSetItemUnitConversion(XolHandle item, int mode, int unit);
 int xolSetItemAxisEqD0(XolHandle item, int unit);
 int xolSetItemAxisEqD1(XolHandle item, int unit, int nx, float x0, float dx);

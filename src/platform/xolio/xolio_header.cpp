@@ -167,6 +167,18 @@ int xolSetItemInfo(XolHandle item, int type, const std::string& name, int unit, 
     return 0;
 }
 
+int xolSetItemAttribute(XolHandle item, const XolAttribute& attribute) {
+    XolItemRec* it = XolItemOf(item);
+    if (it == nullptr || attribute.name.empty()) return XolFail(kXolErrArgument, "bad attribute");
+    for (XolAttribute& a : it->attributes)
+        if (a.name == attribute.name) {
+            a = attribute;
+            return 0;
+        }
+    it->attributes.push_back(attribute);
+    return 0;
+}
+
 int xolSetItemUnitConversion(XolHandle item, int mode, int unit) {
     XolItemRec* it = XolItemOf(item);
     if (it == nullptr || mode != 3) return XolFail(kXolErrArgument, "bad unit conversion");

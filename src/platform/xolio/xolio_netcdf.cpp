@@ -1,4 +1,4 @@
-// Data files on disk: NetCDF in the classic 64-bit data format, written record
+// Data files on disk: NetCDF in the classic format with 64-bit offsets, written record
 // by record and synchronised on every flush, so that a file a run is still
 // writing can be read by another process and a file whose writer died stays
 // readable up to its last flushed step.
@@ -89,7 +89,7 @@ int DefineAxes(int ncid, const XolItemRec& item, int* dimids, GeoHandle frame) {
 
 // The values of an axis: model coordinates, or projected ones where the grid
 // lies unturned on a real map projection, so that the tools of the field
-// place it on the earth.
+// place it on the earth. The header's place is that of the first point.
 void WriteAxisValues(int ncid, const XolItemRec& item, GeoHandle frame) {
     for (int d = 0; d < item.dims; ++d) {
         for (int variant = 0;; ++variant) {
@@ -111,12 +111,15 @@ void WriteAxisValues(int ncid, const XolItemRec& item, GeoHandle frame) {
             double turn = 0.0;
             const bool projected =
                 frame != 0 && d < 2 && GeoProjectionNorth(frame, turn) == 0 && turn == 0.0;
+            // The file's longitude and latitude are those of its first point,
+            // from which the points lie a spacing apart on the grid.
             for (size_t i = 0; i < length; ++i) {
-                const double model = static_cast<double>(item.origin[d]) +
-                                     static_cast<double>(i) * static_cast<double>(item.spacing[d]);
-                double east = model, north = model;
+                const double step = static_cast<double>(i) * static_cast<double>(item.spacing[d]);
+                double east = 0.0, north = 0.0;
                 if (projected)
-                    GeoXy2Proj(frame, d == 0 ? model : 0.0, d == 1 ? model : 0.0, east, north);
+                    GeoXy2Proj(frame, d == 0 ? step : 0.0, d == 1 ? step : 0.0, east, north);
+                else
+                    east = north = static_cast<double>(item.origin[d]) + step;
                 values[i] = d == 0 ? east : north;
             }
             const size_t start = 0;
@@ -126,7 +129,6 @@ void WriteAxisValues(int ncid, const XolItemRec& item, GeoHandle frame) {
     }
 }
 
-const char* StandardName(int type);
 void DefineProjectedPoints(int ncid, int yDim, int xDim);
 
 int DefineItem(int ncid, const XolItemRec& item, int index, bool dynamic, int timeDim,
@@ -150,8 +152,13 @@ int DefineItem(int ncid, const XolItemRec& item, int index, bool dynamic, int ti
     nc_put_att_int(ncid, varid, "item_unit", NC_INT, 1, &item.unit);
     nc_put_att_int(ncid, varid, "item_number", NC_INT, 1, &index);
     PutText(ncid, varid, "item_kind", dynamic ? "dynamic" : "static");
-    if (const char* standard = StandardName(item.type))
-        PutText(ncid, varid, "standard_name", standard);
+    for (const XolAttribute& a : item.attributes) {
+        if (a.values.empty())
+            PutText(ncid, varid, a.name.c_str(), a.text);
+        else
+            nc_put_att_double(ncid, varid, a.name.c_str(), NC_DOUBLE, a.values.size(),
+                              a.values.data());
+    }
     double turn = 0.0;
     if (frame != 0 && item.dims == 2) {
         PutText(ncid, varid, "grid_mapping", "crs");
@@ -163,30 +170,21 @@ int DefineItem(int ncid, const XolItemRec& item, int index, bool dynamic, int ti
     return 0;
 }
 
-// The CF standard name of an item type, where the table has one.
-const char* StandardName(int type) {
-    switch (type) {
-        case 100078:
-            return "sea_surface_height_above_mean_sea_level";
-        case 100280:
-            return "sea_floor_depth_below_sea_surface";
-        case 100097:
-            return "sea_surface_wave_significant_height";
-        default:
-            return nullptr;
-    }
-}
-
 // The grid mapping of a file on a real map projection: the variable "crs"
-// with the CRS as WKT.
-void DefineGridMapping(int ncid, const XolHeaderRec& h, GeoHandle frame) {
-    std::string wkt;
-    GeoCrsWkt(frame, wkt);
+// with the CF parameters of its projection and the CRS as WKT.
+void DefineGridMapping(int ncid, const XolHeaderRec& h) {
+    std::vector<GeoCfAttribute> attributes;
+    GeoCfGridMapping(h.projection, attributes);
     int crs = -1;
     if (nc_def_var(ncid, "crs", NC_INT, 0, nullptr, &crs) != NC_NOERR) return;
-    PutText(ncid, crs, "crs_wkt", wkt);
-    PutText(ncid, crs, "spatial_ref", wkt);
     PutText(ncid, crs, "long_name", h.projection);
+    for (const GeoCfAttribute& a : attributes) {
+        if (a.values.empty())
+            PutText(ncid, crs, a.name.c_str(), a.text);
+        else
+            nc_put_att_double(ncid, crs, a.name.c_str(), NC_DOUBLE, a.values.size(),
+                              a.values.data());
+    }
 }
 
 // For a grid turned on its map: the projected coordinates of every point as
@@ -213,8 +211,8 @@ void WriteProjectedPoints(int ncid, const XolItemRec& item, GeoHandle frame) {
     std::vector<double> east(nx * ny), north(nx * ny);
     for (size_t k = 0; k < ny; ++k)
         for (size_t j = 0; j < nx; ++j)
-            GeoXy2Proj(frame, item.origin[0] + static_cast<double>(j) * item.spacing[0],
-                       item.origin[1] + static_cast<double>(k) * item.spacing[1], east[k * nx + j],
+            GeoXy2Proj(frame, static_cast<double>(j) * item.spacing[0],
+                       static_cast<double>(k) * item.spacing[1], east[k * nx + j],
                        north[k * nx + j]);
     nc_put_var_double(ncid, xv, east.data());
     nc_put_var_double(ncid, yv, north.data());
@@ -293,8 +291,13 @@ int xolFileCreate(const std::string& path, XolHandle header, XolHandle* file) {
     *file = 0;
     XolHeaderRec* h = XolHeaderOf(header);
     if (h == nullptr) return XolFail(kXolErrArgument, "not a header");
+    // The classic format with 64-bit offsets, which every reader of the field
+    // opens, holds a variable of up to 4 GiB a step; a file with a larger one
+    // is NetCDF-4.
+    bool fits = true;
+    for (const auto& item : h->items) fits = fits && item.Size() < (size_t{1} << 30) - 1;
     int ncid = -1;
-    int status = nc_create(path.c_str(), NC_CLOBBER | NC_64BIT_DATA, &ncid);
+    int status = nc_create(path.c_str(), NC_CLOBBER | (fits ? NC_64BIT_OFFSET : NC_NETCDF4), &ncid);
     if (status != NC_NOERR) return XolNcFail(kXolErrWrite, status);
     auto* f = new XolFileRec;
     f->ncid = ncid;
@@ -316,7 +319,7 @@ int xolFileCreate(const std::string& path, XolHandle header, XolHandle* file) {
     WriteGlobals(ncid, *h);
     if (h->geo && !GeoIsNone(h->projection) &&
         GeoOpen(&f->frame, h->projection, h->longitude, h->latitude, h->orientation) == 0)
-        DefineGridMapping(ncid, *h, f->frame);
+        DefineGridMapping(ncid, *h);
     for (size_t i = 0; i < h->items.size(); ++i) {
         if (int code = DefineItem(ncid, h->items[i], static_cast<int>(i + 1), true, timeDim,
                                   h->deleteValue, f->frame, h->items[i].varid)) {

@@ -21,6 +21,7 @@
 #include <type_traits>
 #include <vector>
 
+#include "platform/geo/geo.hpp"
 #include "platform/qty/qty.hpp"
 #include "platform/xolio/xolio_record.hpp"
 
@@ -157,6 +158,7 @@ int ReadAxes(int ncid, int var, int timeDim, XolItemRec& item) {
         if (coord < 0) continue;
         double first = 0.0, step = 0.0;
         if (int code = WeighCoordinate(ncid, coord, length, axis, first, step)) return code;
+        item.first[d] = first;
         float origin = static_cast<float>(first);
         float spacing = length > 1 ? static_cast<float>(step) : 1.0f;
         GetNumber(ncid, coord, "origin", origin);
@@ -260,6 +262,55 @@ int ReadBlocks(int ncid, uint64_t fileSize, XolHeaderRec& h) {
     return 0;
 }
 
+// A map made with another tool (GDAL, xarray) has no header of its place:
+// the place of a file is that of its first point, so the longitude and
+// latitude become those of the first point of its first map and the axes'
+// origins are taken from there. With a grid mapping (crs_wkt, else
+// spatial_ref) the CRS is its WKT, the coordinates lie on that map, and the
+// orientation is that of a grid unturned on it; without one the map lies on
+// no map ("NON-UTM") and the first point's coordinates stand for longitude
+// and latitude. Series and lines stay without a place.
+void PlaceForeignMap(int ncid, XolHeaderRec& h) {
+    std::vector<XolItemRec*> maps;
+    for (auto& item : h.items)
+        if (item.dims >= 2) maps.push_back(&item);
+    for (auto& item : h.statics)
+        if (item->dims >= 2) maps.push_back(item.get());
+    if (maps.empty()) return;
+    const double east = maps[0]->first[0], north = maps[0]->first[1];
+    h.geo = true;
+    h.projection = "NON-UTM";
+    h.longitude = east;
+    h.latitude = north;
+    int crs = -1;
+    const std::string mapping = GetText(ncid, maps[0]->varid, "grid_mapping");
+    std::string wkt;
+    if (!mapping.empty() && nc_inq_varid(ncid, mapping.c_str(), &crs) == NC_NOERR) {
+        wkt = GetText(ncid, crs, "crs_wkt");
+        if (wkt.empty()) wkt = GetText(ncid, crs, "spatial_ref");
+    }
+    if (!wkt.empty()) {
+        h.projection = wkt;
+        h.longitude = h.latitude = 0.0;
+        // A CRS the frame refuses (a geographic one) stays as the text, for
+        // the reader of the file to refuse with its own message.
+        double lon = 0.0, lat = 0.0;
+        GeoHandle frame = 0;
+        if (GeoProjectionOrigin(wkt, lon, lat) != 0 || GeoOpen(&frame, wkt, lon, lat, 0.0) != 0)
+            return;
+        const bool placed = GeoProj2Geo(frame, east, north, lon, lat) == 0 &&
+                            GeoOrientationOnMap(wkt, lon, lat, 0.0, h.orientation) == 0;
+        GeoClose(frame);
+        if (!placed) return;
+        h.longitude = lon;
+        h.latitude = lat;
+    }
+    for (XolItemRec* item : maps) {
+        item->origin[0] = static_cast<float>(item->first[0] - east);
+        item->origin[1] = static_cast<float>(item->first[1] - north);
+    }
+}
+
 // The header and the items of an open file.
 int ReadHeader(int ncid, uint64_t fileSize, XolHeaderRec& h, int& timeDim, int& timeVar) {
     h.title = GetText(ncid, NC_GLOBAL, "title");
@@ -287,7 +338,8 @@ int ReadHeader(int ncid, uint64_t fileSize, XolHeaderRec& h, int& timeDim, int& 
         if (nc_inq_var(ncid, var, name, &type, &ndims, nullptr, nullptr) != NC_NOERR) continue;
         int dimid = -1;
         if (nc_inq_dimid(ncid, name, &dimid) == NC_NOERR) continue;  // a coordinate
-        if (std::strcmp(name, "crs") == 0 || GetText(ncid, var, "grid_mapping_name") != "")
+        if (std::strcmp(name, "crs") == 0 || GetText(ncid, var, "grid_mapping_name") != "" ||
+            GetText(ncid, var, "crs_wkt") != "" || GetText(ncid, var, "spatial_ref") != "")
             continue;
         // Auxiliary coordinates are no items.
         const std::string standard = GetText(ncid, var, "standard_name");
@@ -319,6 +371,10 @@ int ReadHeader(int ncid, uint64_t fileSize, XolHeaderRec& h, int& timeDim, int& 
         else
             h.statics.push_back(std::make_unique<XolItemRec>(std::move(item)));
     }
+    // A header of this library names its projection, blank as it may be.
+    int attribute = -1;
+    if (nc_inq_attid(ncid, NC_GLOBAL, "projection", &attribute) != NC_NOERR)
+        PlaceForeignMap(ncid, h);
     return 0;
 }
 

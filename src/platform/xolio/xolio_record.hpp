@@ -21,10 +21,12 @@ struct XolItemRec {
     int count[4] = {1, 1, 1, 1};
     float origin[4] = {0, 0, 0, 0};
     float spacing[4] = {0, 0, 0, 0};
+    double first[4] = {0, 0, 0, 0};  // the first coordinate of each axis in a file read
     // Statistics of what was written.
     double minimum = 0.0, maximum = 0.0;
     long missing = 0;
     bool anyValue = false;
+    std::vector<XolAttribute> attributes;  // further attributes of the variable
     // On disk.
     int varid = -1;
     struct XolFileRec* source = nullptr;  // the open file a read item comes from

@@ -93,8 +93,12 @@ TEST(MapFrame, ProjectionsAgreeWithTheProjTools) {
             const double meridian =
                 std::atan2(p[1].first - p[2].first, p[1].second - p[2].second) * 180.0 / M_PI;
             GeoProj2Xy(frame, p[0].first, p[0].second, x, y);
+            // The grid's y axis from true north: its turn on the map less the
+            // direction of true north on the map.
+            double turnedNorth = 0.0;
+            GeoProjectionNorth(frame, turnedNorth);
             ASSERT_EQ(GeoTrueNorth(frame, x, y, degrees), 0);
-            EXPECT_NEAR(degrees, meridian - c.orientation, 1e-6) << "at " << lons[k];
+            EXPECT_NEAR(degrees, -turnedNorth - meridian, 1e-6) << "at " << lons[k];
         }
         std::string wkt;
         GeoCrsWkt(frame, wkt);
@@ -133,9 +137,49 @@ TEST(MapFrame, ModelCoordinatesTurnWithTheGrid) {
             EXPECT_NEAR(n - n0, dy * cos - dx * sin, 1e-9) << dx;
         }
         GeoProjectionNorth(frame, north);
-        EXPECT_EQ(north, -c.turn);
+        EXPECT_NEAR(north, -c.turn, 1e-12);
         GeoClose(frame);
     }
+}
+
+// A grid unturned on its map, 1.5 degrees east of the zone's central meridian:
+// the orientation its files record is the meridian convergence there, its
+// frame lies exactly unturned on the map, and a file written for a part of
+// the grid (origin and true north at that part's corner) opens again exactly
+// unturned and at the same place. A turn of 10 degrees on the map is kept.
+TEST(MapFrame, AGridOnItsMapStaysUnturnedThroughFiles) {
+    for (double turn : {0.0, 10.0}) {
+        SCOPED_TRACE(turn);
+        double orientation = 0.0;
+        ASSERT_EQ(GeoOrientationOnMap("UTM-32", 10.5, 54.0, turn, orientation), 0);
+        EXPECT_NEAR(orientation - turn, 1.2136, 1e-3);  // sin(54 deg) * 1.5 deg, about
+        GeoHandle frame = 0, part = 0;
+        ASSERT_EQ(GeoOpen(&frame, "UTM-32", 10.5, 54.0, orientation), 0);
+        double north = -1.0, degrees = 0.0;
+        GeoProjectionNorth(frame, north);
+        EXPECT_EQ(north, -turn);
+        GeoTrueNorth(frame, 0.0, 0.0, degrees);
+        EXPECT_NEAR(degrees, orientation, 1e-12);
+
+        double lon = 0, lat = 0, east = 0, northing = 0, e = 0, n = 0;
+        GeoXy2Geo(frame, 3000.0, 2000.0, lon, lat);
+        GeoTrueNorth(frame, 3000.0, 2000.0, degrees);
+        GeoXy2Proj(frame, 3000.0, 2000.0, east, northing);
+        ASSERT_EQ(GeoOpen(&part, "UTM-32", lon, lat, degrees), 0);
+        GeoProjectionNorth(part, north);
+        if (turn == 0.0)
+            EXPECT_EQ(north, 0.0);
+        else
+            EXPECT_NEAR(north, -turn, 1e-9);
+        GeoXy2Proj(part, 0.0, 0.0, e, n);
+        EXPECT_NEAR(e, east, 1e-6);
+        EXPECT_NEAR(n, northing, 1e-6);
+        GeoClose(part);
+        GeoClose(frame);
+    }
+    double none = -1.0;
+    ASSERT_EQ(GeoOrientationOnMap("NON-UTM", 0.0, 0.0, 30.0, none), 0);
+    EXPECT_EQ(none, 0.0);
 }
 
 // Texts that name no map projection are refused. A short name is

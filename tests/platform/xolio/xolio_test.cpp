@@ -18,6 +18,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/geo/geo.hpp"
 #include "support/test_support.hpp"
 
 namespace {
@@ -49,6 +50,8 @@ XolHandle WriteGrid(const std::string& path, int steps, double orientation = 30.
         EXPECT_EQ(xolSetItemInfo(item, type, name, unit, 1), 0);
         EXPECT_EQ(xolSetItemAxisEqD2(item, 1000, 4, 3, 0.0f, 100.0f, 2.5f, 5.0f), 0);
     }
+    xolSetItemAttribute(xolItemD(h, 1), {"standard_name", "sea_surface_height", {}});
+    xolSetItemAttribute(xolItemD(h, 2), {"position", "", {2.5, 100.0}});
     EXPECT_EQ(xolFileCreate(path, h, &f), 0) << xolLastErrorText();
     std::vector<float> values(12);
     for (int i = 0; i < 12; ++i) values[i] = i - 10.0f;
@@ -126,7 +129,7 @@ TEST(DataFiles, GridFileReadsBackWithAllItHolds) {
         {30.0,
          "geo UTM-32 9 54.25 30",
          {" x = 0, 2.5, 5, 7.5 ;", "Surface_elevation:coordinates = \"projection_y projection_x\"",
-          "500050, 500052.16506"}},  // (2.5, 100) turned 30 degrees
+          "500000, 500002.16506"}},  // (2.5, 0) from the first point, turned 30 degrees
     };
     for (const auto& c : cases) {
         bwtest::TempDir dir;
@@ -172,11 +175,20 @@ TEST(DataFiles, GridFileReadsBackWithAllItHolds) {
             "float Bathymetry(y, x)",
             "time:units = \"seconds since 2004-01-01 06:30:00\"",
             "crs:crs_wkt = \"PROJCRS[\\\"WGS 84 / UTM zone 32N\\\"",
+            "crs:spatial_ref = \"PROJCS[\\\"WGS 84 / UTM zone 32N\\\"",
+            "crs:grid_mapping_name = \"transverse_mercator\"",
+            "crs:longitude_of_central_meridian = 9. ;",
+            "crs:scale_factor_at_central_meridian = 0.9996 ;",
+            "crs:false_easting = 500000. ;",
+            "crs:inverse_flattening = 298.257223563 ;",
             "Surface_elevation:grid_mapping = \"crs\"",
-            "standard_name = \"sea_surface_height_above_mean_sea_level\""};
+            "Surface_elevation:standard_name = \"sea_surface_height\"",
+            "P_flux:position = 2.5, 100. ;"};
         expectedText.insert(expectedText.end(), c.dump.begin(), c.dump.end());
         for (const char* text : expectedText)
             EXPECT_NE(dump.out.find(text), std::string::npos) << text << "\n" << dump.out;
+        // The classic format with 64-bit offsets, which every NetCDF reader opens.
+        EXPECT_EQ(bwtest::ReadFile(path).substr(0, 4), std::string("CDF\x02"));
     }
 }
 
@@ -205,7 +217,10 @@ TEST(DataFiles, AKilledWriterLeavesItsFlushedSteps) {
 
 // A map without time, of another tool: one step of one item of undefined
 // type, the unit from its CF text, the delete value from _FillValue and the
-// axes from the coordinate values.
+// axes from the coordinate values. Its place is its first point: without a
+// grid mapping on no map, at the first point's coordinates; with one (as GDAL
+// and xarray write it) on the CRS of its WKT, at the longitude and latitude
+// of that point and the orientation of a grid unturned on its map.
 TEST(DataFiles, AFileMadeWithNcgenTakesSensibleDefaults) {
     bwtest::TempDir dir;
     const std::string path =
@@ -218,12 +233,48 @@ TEST(DataFiles, AFileMadeWithNcgenTakesSensibleDefaults) {
     XolHandle h = 0, f = 0;
     ASSERT_EQ(xolFileRead(path, &h, &f), 0) << xolLastErrorText();
     EXPECT_EQ(Describe(h),
-              "1 '' '' 0 delete -999 data 0\ntime 1 unit 1400 0+1x1@0"
-              "\nitem 999 'depth' 1000 1 axis 5 1000: 3,100,10 2,50,10");
+              "1 '' '' 0 delete -999 data 0 geo NON-UTM 100 50 0\ntime 1 unit 1400 0+1x1@0"
+              "\nitem 999 'depth' 1000 1 axis 5 1000: 3,0,10 2,0,10");
     std::vector<float> depth(6);
     ASSERT_EQ(xolReadItemTimeStep(h, f, nullptr, depth.data()), 0);
     EXPECT_EQ(depth, (std::vector<float>{-5, -4, -3, -2, -1, -999}));
     EXPECT_EQ(xolReadItemTimeStep(h, f, nullptr, depth.data()), kXolErrEnd);
+    xolFileClose(f);
+    xolHeaderDestroy(h);
+
+    const char* wkt =
+        "PROJCS[\\\"ETRS89 / UTM zone 32N\\\",GEOGCS[\\\"ETRS89\\\",DATUM[\\\"ETRS89\\\","
+        "SPHEROID[\\\"GRS 1980\\\",6378137,298.257222101]],PRIMEM[\\\"Greenwich\\\",0],"
+        "UNIT[\\\"degree\\\",0.0174532925199433]],PROJECTION[\\\"Transverse_Mercator\\\"],"
+        "PARAMETER[\\\"latitude_of_origin\\\",0],PARAMETER[\\\"central_meridian\\\",9],"
+        "PARAMETER[\\\"scale_factor\\\",0.9996],PARAMETER[\\\"false_easting\\\",500000],"
+        "PARAMETER[\\\"false_northing\\\",0],UNIT[\\\"metre\\\",1]]";
+    const std::string mapped =
+        Ncgen(dir, "mapped",
+              std::string("netcdf mapped {\ndimensions:\n x = 3 ;\n y = 2 ;\nvariables:\n"
+                          " double x(x) ;\n double y(y) ;\n int spatial_ref ;\n"
+                          "  spatial_ref:spatial_ref = \"") +
+                  wkt +
+                  "\" ;\n float band(y, x) ;\n  band:grid_mapping = \"spatial_ref\" ;\n"
+                  "data:\n x = 600005, 600015, 600025 ;\n y = 6000005, 6000015 ;\n"
+                  " band = 1, 2, 3, 4, 5, 6 ;\n}\n");
+    ASSERT_EQ(xolFileRead(mapped, &h, &f), 0) << xolLastErrorText();
+    std::string projection;
+    double lon = 0, lat = 0, orientation = 0, x = 0, y = 0, turn = 1;
+    ASSERT_EQ(xolGetGeoInfoUTMProj(h, &projection, &lon, &lat, &orientation), 0);
+    EXPECT_EQ(projection.substr(0, 29), "PROJCS[\"ETRS89 / UTM zone 32N");
+    EXPECT_EQ(xolGetNoOfItems(h), 1);  // the grid mapping is no item
+    EXPECT_EQ(Describe(h).substr(Describe(h).find("\nitem")),
+              "\nitem 999 'band' 99000 1 axis 5 1000: 3,0,10 2,0,10");
+    GeoHandle frame = 0;
+    ASSERT_EQ(GeoOpen(&frame, projection, lon, lat, orientation), 0);
+    GeoXy2Proj(frame, 0.0, 0.0, x, y);
+    GeoProjectionNorth(frame, turn);
+    EXPECT_NEAR(x, 600005.0, 1e-6);
+    EXPECT_NEAR(y, 6000005.0, 1e-6);
+    EXPECT_EQ(turn, 0.0);
+    EXPECT_NEAR(orientation, 1.3, 0.1);  // about 1.6 degrees east of the meridian at 54 N
+    GeoClose(frame);
     xolFileClose(f);
     xolHeaderDestroy(h);
 }
@@ -281,9 +332,9 @@ TEST(DataFiles, EveryFailureGivesItsCodeAndItsReason) {
     const std::string good = dir / "good.xol2";
     xolHeaderDestroy(WriteGrid(good, 2));
     const std::string bytes = bwtest::ReadFile(good);
-    // The count of axes (bytes 16 to 23 of the 64-bit data format) beyond the file.
+    // The count of axes (bytes 12 to 15 of the classic format) beyond the file.
     std::string lying = bytes;
-    lying.replace(16, 8, std::string("\0\0\0\0\x7f\xff\xff\xff", 8));
+    lying.replace(12, 4, std::string("\x7f\xff\xff\xff", 4));
     const std::string open = std::to_string(kXolErrOpen) + " ";
     const std::string format = std::to_string(kXolErrFormat) + " ";
     const struct {

@@ -11,6 +11,8 @@
 #include <vector>
 
 #include "bwdata/bwdata.hpp"
+#include "bwdata/raster.hpp"
+#include "bwdata/waves.hpp"
 #include "data/xolfile.hpp"
 #include "run/messages.hpp"
 
@@ -26,8 +28,15 @@ const char* kUsage =
     "                    [--types C,...] [--units U,...] [--title TEXT]\n"
     "  bwdata import-csv LINE.csv -o OUT.xol1 --dx DX --start \"...\" [--type C] [--unit U] "
     "[--name TEXT]\n"
-    "  bwdata export FILE -o OUT.csv|OUT.asc [--item N] [--step N]\n"
-    "  bwdata export FILE -o OUT.csv|OUT.asc --static N\n";
+    "  bwdata import-raster RASTER -o OUT.xol2 [--band N] [--projection TEXT] [--origin LON,LAT]\n"
+    "                    [--name TEXT] [--type CODE] [--unit CODE] [--title TEXT]\n"
+    "  bwdata export FILE -o OUT.csv|OUT.asc|OUT.tif [--item N] [--step N]\n"
+    "  bwdata export FILE -o OUT.csv|OUT.asc|OUT.tif --static N\n"
+    "  bwdata waves -o OUT.xol0|OUT.xol1 --drive level|flux|source --depth D --dt DT\n"
+    "               --duration S --start \"...\" (--height H --period T | --hm0 H --tp T\n"
+    "               [--gamma G] [--spreading S] [--band LOW,HIGH] [--components N] [--seed N])\n"
+    "               [--side SIDE] [--direction DEG] [--ramp S] [--deep B] [--points N]\n"
+    "               [--grid DX[,DY]] [--title TEXT]\n";
 
 int Fail(const std::string& text) {
     std::fprintf(stderr, "bwdata: %s\n", text.c_str());
@@ -81,15 +90,20 @@ int main(int argc, char** argv) {
         std::fputs(kUsage, argc < 2 ? stderr : stdout);
         return argc < 3 && !(argc == 2 && std::strcmp(argv[1], "--help") == 0) ? 2 : 0;
     }
+    // Waves from H and T take options only, read by their own parser.
+    if (std::strcmp(argv[1], "waves") == 0)
+        return WavesCommand(std::vector<std::string>(argv + 2, argv + argc));
     const std::string command = argv[1], input = argv[2];
     if (command != "info" && command != "import-asc" && command != "import-csv" &&
-        command != "export")
+        command != "import-raster" && command != "export")
         return Fail("unknown command " + command + "\n" + kUsage);
     std::string output, start, text;
     AscOptions asc;
     CsvOptions csv;
     int item = 1, step = -1, staticItem = 0;
     bool dynamicChosen = false;  // --item or --step given
+    RasterOptions raster;
+    bool projectionGiven = false;
     for (int i = 3; i < argc; ++i) {
         const std::string arg = argv[i];
         if (i + 1 >= argc) return Fail("option " + arg + " needs a value");
@@ -99,7 +113,7 @@ int main(int argc, char** argv) {
         if (arg == "-o")
             output = value;
         else if (arg == "--projection")
-            asc.projection = value;
+            asc.projection = value, projectionGiven = true;
         else if (arg == "--origin") {
             if (std::sscanf(value.c_str(), "%lf,%lf", &asc.longitude, &asc.latitude) != 2)
                 return Fail("--origin needs LON,LAT");
@@ -108,6 +122,7 @@ int main(int argc, char** argv) {
             asc.orientation = std::strtod(value.c_str(), &end);
             if (end == value.c_str() || *end != '\0' || !std::isfinite(asc.orientation))
                 return Fail("--orientation needs degrees");
+            raster.orientationGiven = true;
         } else if (arg == "--name")
             asc.name = csv.name = value;
         else if (arg == "--title")
@@ -133,6 +148,9 @@ int main(int argc, char** argv) {
         } else if (arg == "--step") {
             if (!Integer(value, step) || step < 0) return Fail("--step needs a number from 0");
             dynamicChosen = true;
+        } else if (arg == "--band") {
+            if (!Integer(value, raster.band) || raster.band < 1)
+                return Fail("--band needs a number from 1");
         } else if (arg == "--static") {
             if (!Integer(value, staticItem) || staticItem < 1)
                 return Fail("--static needs a number from 1");
@@ -174,13 +192,18 @@ int main(int argc, char** argv) {
     if (output.empty()) return Fail("-o OUTPUT is missing");
     if (command == "import-asc")
         text = ImportAsc(input, output, asc);
-    else if (command == "import-csv") {
+    else if (command == "import-raster") {
+        raster.map = asc;
+        if (!projectionGiven) raster.map.projection.clear();  // the raster's own CRS
+        text = ImportRaster(input, output, raster);
+    } else if (command == "import-csv") {
         if (csv.start.empty()) return Fail("--start \"YYYY-MM-DD hh:mm:ss\" is missing");
         text = ImportCsv(input, output, csv);
     } else {
         if (staticItem > 0 && dynamicChosen)
             return Fail("--static exports a static item, which has no --item or --step");
-        text = ExportText(input, output, item, step, staticItem);
+        text = IsRasterOutput(output) ? ExportRaster(input, output, item, step, staticItem)
+                                      : ExportText(input, output, item, step, staticItem);
     }
     if (!text.empty()) return Fail(text);
     std::printf("%s written\n", output.c_str());

@@ -9,8 +9,10 @@
 #include <sstream>
 
 #include "bwdata/bwdata.hpp"
+#include "bwdata/raster.hpp"
 #include "data/geoframe.hpp"
 #include "data/xolfile.hpp"
+#include "platform/geo/geo.hpp"
 #include "platform/qty/qty.hpp"
 #include "run/datetime.hpp"
 
@@ -158,38 +160,52 @@ std::string ImportAsc(const std::string& input, const std::string& output,
                std::to_string(nrows);
 
     // The first row is the northernmost: it becomes the row k = K.
-    std::vector<float> map(rows.size());
+    MapGrid grid;
+    grid.columns = ncols;
+    grid.rows = nrows;
+    grid.cell = cell;
+    grid.values.resize(rows.size());
     for (long k = 0; k < nrows; ++k)
-        for (long j = 0; j < ncols; ++j) map[k * ncols + j] = rows[(nrows - 1 - k) * ncols + j];
+        for (long j = 0; j < ncols; ++j)
+            grid.values[k * ncols + j] = rows[(nrows - 1 - k) * ncols + j];
+    const double half = centre ? 0.0 : 0.5 * cell;
+    grid.x0 = x0 + half;
+    grid.y0 = y0 + half;
+    return WriteMapFile(grid, input, output, options);
+}
 
+std::string WriteMapFile(const MapGrid& grid, const std::string& input, const std::string& output,
+                         const AscOptions& options) {
+    if (std::string e = CheckType(options.type, options.unit, input); !e.empty()) return e;
     double lon = options.longitude, lat = options.latitude;
-    if (!options.originGiven && !GeoIsNone(options.projection)) {
-        // The geographic position of the lower-left cell centre.
-        GeoHandle frame = 0;
-        int status = 0;
-        GeoFrameOpen(frame, options.projection, 0.0, 0.0, 0.0, &status);
-        if (status != 0) return "unknown projection: " + options.projection;
-        const double half = centre ? 0.0 : 0.5 * cell;
-        GeoFrameProj2Geo(frame, x0 + half, y0 + half, lon, lat, &status);
-        GeoClose(frame);
-        if (status != 0) return input + ": the grid's corner lies outside the projection";
-    } else if (!GeoIsNone(options.projection)) {
-        GeoHandle frame = 0;
-        int status = 0;
-        GeoFrameOpen(frame, options.projection, lon, lat, options.orientation, &status);
-        if (status != 0) return "unknown projection: " + options.projection;
-        GeoClose(frame);
+    double orientation = options.orientation;  // on no map: as given
+    if (!GeoIsNone(options.projection)) {
+        if (!options.originGiven) {
+            // The geographic position of the lower-left cell centre.
+            GeoHandle frame = 0;
+            int status = 0;
+            GeoFrameOpen(frame, options.projection, 0.0, 0.0, 0.0, &status);
+            if (status != 0) return "unknown projection: " + options.projection;
+            GeoFrameProj2Geo(frame, grid.x0, grid.y0, lon, lat, &status);
+            GeoClose(frame);
+            if (status != 0) return input + ": the grid's corner lies outside the projection";
+        }
+        // A file records the orientation from true north: the turn on the map
+        // plus the meridian convergence at the origin.
+        if (GeoOrientationOnMap(options.projection, lon, lat, options.orientation, orientation) !=
+            0)
+            return "unknown projection: " + options.projection;
     }
     return WriteData(output, [&](const std::string& part, int& status) -> std::string {
         XolFile f = XolCreateHeader(options.title.empty() ? options.name : options.title, 1, 2,
                                     {.appTitle = "bwdata"}, &status);
         if (status != 0) return "";
         XolSetItem(f, 1, options.type, options.name, options.unit, &status);
-        XolSetAxis(f, 1, static_cast<float>(cell), 0.0f, static_cast<int>(ncols));
-        XolSetAxis(f, 2, static_cast<float>(cell), 0.0f, static_cast<int>(nrows));
-        XolSetProjection(f, options.projection, lon, lat, options.orientation);
+        XolSetAxis(f, 1, static_cast<float>(grid.cell), 0.0f, static_cast<int>(grid.columns));
+        XolSetAxis(f, 2, static_cast<float>(grid.cell), 0.0f, static_cast<int>(grid.rows));
+        XolSetProjection(f, options.projection, lon, lat, orientation);
         XolCreateFile(f, part, &status);
-        if (status == 0) XolWriteDynamic(f, map.data(), &status);
+        if (status == 0) XolWriteDynamic(f, grid.values.data(), &status);
         XolClose(f);
         return "";
     });

@@ -290,7 +290,13 @@ void PlaceForeignMap(int ncid, XolHeaderRec& h) {
         if (wkt.empty()) wkt = GetText(ncid, crs, "spatial_ref");
     }
     if (!wkt.empty()) {
-        h.projection = wkt;
+        // A CRS known by a code is kept by it (a WKT is longer than a header's
+        // projection may be).
+        std::string code;
+        const bool known = GeoShortName(wkt, code) == 0 &&
+                           (code.rfind("UTM-", 0) == 0 || code.find(':') != std::string::npos);
+        h.projection = known ? code : wkt;
+        wkt = h.projection;
         h.longitude = h.latitude = 0.0;
         // A CRS the frame refuses (a geographic one) stays as the text, for
         // the reader of the file to refuse with its own message.

@@ -5,9 +5,12 @@ set -euo pipefail
 . "$(dirname "$0")/../common.sh"
 
 make_maps "Flume with a shoal" "Sponge layer"
-# The surface elevation in metres and its curvature (d2eta/dx2) per metre.
-"$bwdata" import-csv waves.csv -o waves.xol0 --start "2026-01-01 12:00:00" \
-    --types 100078,999 --units 1000,1050 --title "Incoming wave" >/dev/null
+# Regular waves of 4 cm and 1.5 s at the west boundary, 0.6 m deep: the surface
+# elevation and its curvature across the boundary, which the deep-water terms
+# of the model (Dispersion_Factor 1/15) take.
+"$bwdata" waves -o waves.xol0 --drive level --depth 0.6 --height 0.04 --period 1.5 \
+    --deep 0.0666667 --dt 0.05 --duration 45 --start "2026-01-01 12:00:00" \
+    --title "Incoming wave" >/dev/null
 
 echo "Running bw shoal.bw ..."
 start=$(date +%s.%N)

@@ -35,12 +35,25 @@ std::string BadValue(const std::string& token, double& value) {
     return "";
 }
 
+// The fields of a CSV row as RFC 4180 has them: a field in double quotes may
+// hold the separator, and a doubled quote inside stands for one, as bwdata
+// export writes gauge names ("P(3,4): Surface elevation").
 std::vector<std::string> Split(const std::string& line, char separator) {
-    std::vector<std::string> fields;
-    std::string field;
-    std::istringstream in(line);
-    while (std::getline(in, field, separator)) fields.push_back(field);
-    if (!line.empty() && line.back() == separator) fields.emplace_back();
+    std::vector<std::string> fields(1);
+    bool quoted = false;
+    for (size_t i = 0; i < line.size(); ++i) {
+        const char c = line[i];
+        if (quoted && c == '"' && i + 1 < line.size() && line[i + 1] == '"') {
+            fields.back() += '"';
+            ++i;
+        } else if (c == '"' && (quoted || fields.back().empty())) {
+            quoted = !quoted;
+        } else if (c == separator && !quoted) {
+            fields.emplace_back();
+        } else {
+            fields.back() += c;
+        }
+    }
     return fields;
 }
 

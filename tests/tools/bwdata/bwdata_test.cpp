@@ -119,13 +119,18 @@ std::string WriteResult(const bwtest::TempDir& dir, const std::string& name, int
 
 // Gauge names hold commas and quotes ("P(3,4): Surface elevation"): such a
 // header field is quoted, quotes doubled, so that every row has as many
-// fields as the header; a plain name stays as it is.
+// fields as the header; a plain name stays as it is. import-csv reads such a
+// file back with the same names.
 TEST_F(DataTool, SeriesHeaderQuotesNamesWithCommasAndQuotes) {
     WriteResult(dir, "gauges.xol0", 0, {"P(3,4): Surface elevation", "Say \"high\"", "Level"}, {});
     Ok({"export", "gauges.xol0", "-o", "gauges.csv"});
-    EXPECT_EQ(bwtest::ReadFile(dir / "gauges.csv"),
-              "time,\"P(3,4): Surface elevation\",\"Say \"\"high\"\"\",Level\n"
-              "0,10,20,30\n0.5,11,21,31\n");
+    const std::string csv =
+        "time,\"P(3,4): Surface elevation\",\"Say \"\"high\"\"\",Level\n"
+        "0,10,20,30\n0.5,11,21,31\n";
+    EXPECT_EQ(bwtest::ReadFile(dir / "gauges.csv"), csv);
+    Ok({"import-csv", "gauges.csv", "-o", "back.xol0", "--start", "2026-01-01 12:00:00"});
+    Ok({"export", "back.xol0", "-o", "back.csv"});
+    EXPECT_EQ(bwtest::ReadFile(dir / "back.csv"), csv);
 }
 
 // The static items of a result file (the bathymetry of a map) are exported by

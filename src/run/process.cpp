@@ -8,6 +8,7 @@
 #include <new>
 
 #include "run/messages.hpp"
+#include "run/threads.hpp"
 
 ProcessState gProcess;
 
@@ -84,6 +85,18 @@ void GatherMachines() {
     gProcess.machineCount = static_cast<int>(gProcess.machineNames.size());
 }
 
+// The processes of the run that share this machine's memory, this one included.
+int LocalProcesses() {
+    MPI_Comm local;
+    if (MPI_Comm_split_type(MPI_COMM_WORLD, MPI_COMM_TYPE_SHARED, 0, MPI_INFO_NULL, &local) !=
+        MPI_SUCCESS)
+        return 1;
+    int size = 1;
+    MPI_Comm_size(local, &size);
+    MPI_Comm_free(&local);
+    return std::max(size, 1);
+}
+
 }  // namespace
 
 void ProcessStart() {
@@ -118,7 +131,12 @@ void ProcessStart() {
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();
     gProcess.threadCount = 1;
+    gProcess.threadReason.clear();
+    gProcess.onlineProcessors = std::max(1, static_cast<int>(sysconf(_SC_NPROCESSORS_ONLN)));
+    gProcess.localProcessCount = gProcess.mpiActive ? LocalProcesses() : 1;
     omp_init_lock(&gProcess.threadLock);
+
+    NoteThreadStart();
 }
 
 void ProcessFinish() {
@@ -153,6 +171,13 @@ void WriteComputingEnvironment() {
             WriteLine("  " + line);
         }
     }
+    // How the thread count will be chosen once the grid is known, and how
+    // waiting threads wait.
+    const int requested = RequestedThreads(std::getenv("OMP_NUM_THREADS"));
+    WriteLabelled("Threads requested    : %",
+                  requested > 0 ? std::to_string(requested) + " (OMP_NUM_THREADS)"
+                                : std::string("by grid size and idle processors"));
+    WriteLabelled("Waiting threads      : %", WaitingThreadsText());
     WriteBlockHeading("");
 }
 

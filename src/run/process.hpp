@@ -20,10 +20,13 @@ struct ProcessState {
     std::vector<std::string> machineNames;
     std::vector<int> processMachine;
     std::vector<int> machineProcesses;
-    int processorCount = 1;  // processors seen by the threads runtime
-    int maxThreads = 1;      // the runtime's maximum of threads
-    int threadCount = 1;     // the number in use
-    bool mpiActive = false;  // message passing was brought up by ProcessStart
+    int processorCount = 1;     // processors seen by the threads runtime
+    int maxThreads = 1;         // the runtime's maximum of threads
+    int threadCount = 1;        // the number in use
+    std::string threadReason;   // why that number, for the log
+    int onlineProcessors = 1;   // processors of the machine, whatever this process may use
+    int localProcessCount = 1;  // processes of the run on this machine, this one included
+    bool mpiActive = false;     // message passing was brought up by ProcessStart
     omp_lock_t threadLock;
 };
 extern ProcessState gProcess;

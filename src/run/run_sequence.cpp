@@ -11,8 +11,10 @@
 #include "run/process.hpp"
 #include "run/progress.hpp"
 #include "run/run_state.hpp"
+#include "run/threads.hpp"
 #include "run/timing.hpp"
 #include "run/units.hpp"
+#include "solver2d/model_state.hpp"
 #include "solver2d/time_loop.hpp"
 
 namespace {
@@ -130,7 +132,9 @@ void RunMain(int argc, const char* const* argv) {
         StopTiming(gOverallTiming, kTaskTotal);
         Shutdown(gRun.parameterFileName, 0);
     }
-    SetThreads(gProcess.maxThreads);
+    // As many threads as the grid has work for and processors are idle, or
+    // OMP_NUM_THREADS; the log says how many and why.
+    SetRunThreads(static_cast<long long>(gGrid.Points()));
     StopTiming(gOverallTiming, kTaskPreProcessing);
 
     // The solver hands back its exit code: 0, or -1 after a cancel.

@@ -64,7 +64,9 @@ void MakeBasin(int32_t n, int32_t handle, int32_t steps) {
 double CopyBandwidth(size_t floats, int threads) {
     std::vector<float> a(floats, 1.0f), b(floats, 0.0f);
     omp_set_num_threads(threads);
-    const int repeats = std::max<int>(3, static_cast<int>(2e8 / floats));
+    // At most a few thousand parallel loops: on a small grid each costs more
+    // in starting and ending the loop than in copying.
+    const int repeats = std::clamp<int>(static_cast<int>(2e8 / floats), 3, 2000);
     const double start = WallSeconds();
     for (int r = 0; r < repeats; ++r) {
 #pragma omp parallel for schedule(static)
@@ -226,8 +228,8 @@ int main(int argc, char** argv) {
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();
     // bwbench [scale [n [family [threads]]]]: a shorter run for tests, or one
-    // grid size, sweep family (0 central, 1 and 2 upwind) and thread count to
-    // profile; bwbench scale n processes: the table of the processes alone.
+    // grid size (any n), sweep family (0 central, 1 and 2 upwind) and thread
+    // count to profile; bwbench scale n processes: the table of the processes alone.
     const double scale = argc > 1 ? std::atof(argv[1]) : 1.0;
     const int32_t onlyN = argc > 2 ? std::atoi(argv[2]) : 0;
     // "processes" in place of the family: only the table of the processes.
@@ -237,8 +239,12 @@ int main(int argc, char** argv) {
     std::printf("%-11s %-11s %7s %13s %13s %8s %8s %9s %8s %8s\n", "grid", "sweeps", "threads",
                 "points/cpu-s", "points/wall-s", "x-sweep", "y-sweep", "copy GB/s", "B/point",
                 "GB/s");
-    for (int32_t n : {200, 500, 1000}) {
-        if ((onlyN > 0 && n != onlyN) || onlyProcesses) continue;
+    // One size given on the command line may be any size, for finding where
+    // a second thread starts to gain.
+    const std::vector<int32_t> sizes = onlyN > 0 ? std::vector<int32_t>{onlyN}
+                                                 : std::vector<int32_t>{200, 500, 1000};
+    for (int32_t n : sizes) {
+        if (onlyProcesses) continue;
         const int32_t steps = std::max(2, static_cast<int32_t>(scale * 4e7 / (double(n) * n)));
         for (int32_t handle : {0, 1, 2}) {
             if (onlyHandle >= 0 && handle != onlyHandle) continue;

@@ -6,6 +6,7 @@
 
 #include "data/xolfile.hpp"
 #include "support/test_support.hpp"
+#include "tools/bwdata/tool_fixture.hpp"
 
 namespace fs = std::filesystem;
 
@@ -15,20 +16,6 @@ testing::AssertionResult Has(const std::string& text, const std::string& part) {
     if (text.find(part) != std::string::npos) return testing::AssertionSuccess();
     return testing::AssertionFailure() << "no \"" << part << "\" in:\n" << text;
 }
-
-class DataTool : public testing::Test {
-protected:
-    bwtest::TempDir dir;
-    bwtest::RunResult Run(std::vector<std::string> args) {
-        args.insert(args.begin(), bwtest::BuiltProgram("bwdata"));
-        return bwtest::RunProgram(args, dir.path.string());
-    }
-    // Runs the tool where it must succeed.
-    void Ok(const std::vector<std::string>& args) {
-        const auto r = Run(args);
-        EXPECT_EQ(r.exitCode, 0) << r.err;
-    }
-};
 
 // A grid comes back as it went in, holes included; its rows run south to north
 // in the long form.

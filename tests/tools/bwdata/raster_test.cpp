@@ -12,6 +12,7 @@
 
 #include "data/xolfile.hpp"
 #include "support/test_support.hpp"
+#include "tools/bwdata/tool_fixture.hpp"
 
 namespace fs = std::filesystem;
 
@@ -98,25 +99,7 @@ double Convergence(const std::string& crs, double lon, double lat) {
     return -std::atan2(e1 - e0, n1 - n0) * 180.0 / 3.14159265358979323846;
 }
 
-class RasterTool : public testing::Test {
-protected:
-    bwtest::TempDir dir;
-    bwtest::RunResult Run(std::vector<std::string> args) {
-        args.insert(args.begin(), bwtest::BuiltProgram("bwdata"));
-        return bwtest::RunProgram(args, dir.path.string());
-    }
-    void Ok(const std::vector<std::string>& args) {
-        const auto r = Run(args);
-        EXPECT_EQ(r.exitCode, 0) << r.err;
-    }
-    // Refused with `message`, leaving no output (the last argument) behind.
-    void Refused(const std::vector<std::string>& args, const std::string& message) {
-        const auto r = Run(args);
-        EXPECT_EQ(r.exitCode, 1) << args[1];
-        EXPECT_NE(r.err.find("bwdata: " + message), std::string::npos) << r.err;
-        EXPECT_FALSE(fs::exists(dir / args.back()) || fs::exists(dir / (args.back() + ".part")));
-    }
-};
+using RasterTool = DataTool;
 
 // 4 x 3 cells of 10 m on ETRS89 / UTM 32N, well off the central meridian so
 // that true and map north differ. The northernmost row is the last of the

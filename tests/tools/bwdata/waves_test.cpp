@@ -21,6 +21,7 @@
 #include "solver2d/model_state.hpp"
 #include "support/log_capture.hpp"
 #include "support/model_builder.hpp"
+#include "tools/bwdata/tool_fixture.hpp"
 
 namespace fs = std::filesystem;
 
@@ -131,10 +132,9 @@ TEST(WavesPieces, TheSeedRepeatsTheSeaAndTheDirectionsSpreadAsAsked) {
     EXPECT_NE(WaveComponents(o, a), "");
 }
 
-class WavesFile : public testing::Test {
+class WavesFile : public DataTool {
 protected:
     bwtest::LogCapture log;
-    bwtest::TempDir dir;
     WavesOptions Regular(WaveDrive drive, double H, double T) const {
         WavesOptions o;
         o.drive = drive, o.height = H, o.period = T, o.depth = 1.0, o.B = kB, o.deep = true;
@@ -207,23 +207,16 @@ TEST_F(WavesFile, BadInputIsRefusedAndLeavesNoFile) {
     for (const auto& c : cases) {
         std::vector<std::string> args = base;
         args.insert(args.end(), c.extra.begin(), c.extra.end());
-        args.insert(args.begin(), bwtest::BuiltProgram("bwdata"));
-        const auto r = bwtest::RunProgram(args, dir.path.string());
-        EXPECT_EQ(r.exitCode, 1) << c.says;
-        EXPECT_EQ(r.err.rfind("bwdata: ", 0), 0u) << r.err;
-        EXPECT_NE(r.err.find(c.says), std::string::npos) << r.err;
-        EXPECT_FALSE(fs::exists(dir / "w.xol0"));
-        EXPECT_FALSE(fs::exists(dir / "w.xol0.part"));
+        Refused(args, c.says);
     }
     // A good command writes the file; one into a missing folder leaves nothing.
     std::vector<std::string> good = base;
-    good.insert(good.begin(), bwtest::BuiltProgram("bwdata"));
     for (const char* a : {"--drive", "level", "--height", "0.1", "--period", "2"})
         good.push_back(a);
-    EXPECT_EQ(bwtest::RunProgram(good, dir.path.string()).exitCode, 0);
+    Ok(good);
     EXPECT_TRUE(fs::exists(dir / "w.xol0"));
     good[2] = "no/such/w.xol0";
-    EXPECT_EQ(bwtest::RunProgram(good, dir.path.string()).exitCode, 1);
+    EXPECT_EQ(Run(good).exitCode, 1);
     EXPECT_FALSE(fs::exists(dir / "no"));
 }
 

@@ -6,6 +6,8 @@
 
 #include "data/tsfunc.hpp"
 #include "input/kvt_access.hpp"
+#include "meshsolver/output_info.hpp"
+#include "meshsolver/translation.hpp"
 #include "output/deterministic.hpp"
 #include "output/output_sections.hpp"
 #include "processes/friction.hpp"
@@ -25,6 +27,7 @@
 
 BasicSettings gBasic;
 BathymetrySettings gBathymetry;
+std::string gMeshSolverFileName;
 
 namespace {
 
@@ -158,8 +161,9 @@ DataFileRef ReadDataFile(KvtHandle parent, int32_t maxItems) {
     return ref;
 }
 
-void ReadModelSetup(KvtHandle file, const std::string& /*fileName*/) {
+void ReadModelSetup(KvtHandle file, const std::string& fileName) {
     const KvtHandle target = KvtOpenTarget(file, kModelTarget);
+    gMeshSolverFileName.clear();
     ReadBasicModelParameters(target);
     const bool twoD = gBasic.numberOfDimensions == 2;
     ReadBathymetry(target);
@@ -175,19 +179,29 @@ void ReadModelSetup(KvtHandle file, const std::string& /*fileName*/) {
     SetupEddyViscosity(target);
     SetupPorosity(target);
     SetupSpongeLayer(target);
-    // The mesh solver's own sections (its boundaries, generation lines and
-    // outputs) are read with its file, which this version does not write.
-    if (!twoD) StopRun("The 1DH mesh solver is not yet available in this version");
     SetupInitialSurface(target);
 
     SetupOpenBoundaries(target);
     SetupInternalGeneration(target);
 
-    SetupOutputDeterministic2D(target);
-    SetupOutputStatistic2D(target);
-    SetupOutputDisturbance2D(target);
-    SetupOutputHotstart2D(target);
+    if (twoD) {
+        SetupOutputDeterministic2D(target);
+        SetupOutputStatistic2D(target);
+        SetupOutputDisturbance2D(target);
+        SetupOutputHotstart2D(target);
+    } else {
+        SetupOutputInfo1D(target);
+    }
 
     ReadOptionParameters(target);
-    ReportSchemeStability();
+    if (twoD) {
+        ReportSchemeStability();
+        return;
+    }
+    // The mesh solver reads nothing of the model file but the second file
+    // written here: what the model file holds and no setting read is told
+    // now, before its tree is closed.
+    KvtWarnUnread(file);
+    WriteMeshSolverFile(fileName, gMeshSolverFileName);
+    kvtClose(&file);
 }

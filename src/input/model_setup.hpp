@@ -38,9 +38,14 @@ struct DataFileRef {
     int32_t Item() const { return itemNumbers[0]; }  // the number that selects the item
 };
 
+// The second parameter file of a 1DH run, written by the model reader as its
+// last act and opened by the mesh solver; empty with two dimensions.
+extern std::string gMeshSolverFileName;
+
 // Reads the reader's whole model setup from the opened parameter file;
 // fileName is its path. Ends with the number of dimensions and all settings
-// known, or stops the run.
+// known, or stops the run. With one dimension it ends by writing the mesh
+// solver's file beside the model file and closing the model file's tree.
 void ReadModelSetup(KvtHandle file, const std::string& fileName);
 
 // The sub-section DATA_FILE of parent: File_name, Item_Count (cut to

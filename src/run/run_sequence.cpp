@@ -132,6 +132,10 @@ void RunMain(int argc, const char* const* argv) {
         StopTiming(gOverallTiming, kTaskTotal);
         Shutdown(gRun.parameterFileName, 0);
     }
+    // A 1DH model is read and its mesh solver file written; the solver that
+    // runs it is still to come.
+    if (gBasic.numberOfDimensions == 1)
+        StopRun("The 1DH mesh solver is not yet available in this version");
     // As many threads as the grid has work for and processors are idle, or
     // OMP_NUM_THREADS; the log says how many and why.
     SetRunThreads(static_cast<long long>(gGrid.Points()));

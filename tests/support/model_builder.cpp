@@ -124,6 +124,10 @@ std::string ModelText(const std::string& bathymetryFile,
         {"Output_Statistic_2D", "Type = 0\n"},
         {"Output_Disturbance_2D", "Type = 0\n"},
         {"Output_Hotstart_2D", "Hot_Start = false\n"},
+        // The outputs of the 1DH model, left out unless given.
+        {"OUTPUT_DETERMINISTIC_1D", "-"},
+        {"OUTPUT_STATISTIC_1D", "-"},
+        {"OUTPUT_MOVING_SHORELINE_1D", "-"},
         {"OPTION_PARAMETERS", "HUD_update_2DH = 0\n"},
     };
     for (const auto& [name, body] : sections)

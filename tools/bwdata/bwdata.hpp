@@ -33,6 +33,12 @@ struct CsvOptions {
 std::string ImportCsv(const std::string& input, const std::string& output,
                       const CsvOptions& options);
 
+// A profile for the 1DH model from a CSV of x and bed level (a header line,
+// then x, z a row, x rising): a line file of the bed with the points dx apart
+// when they are, else of two items, the positions x and the bed.
+std::string ImportProfile(const std::string& input, const std::string& output,
+                          const std::string& title);
+
 // A file as text: a series or line file as CSV, a map at a step as an ESRI
 // ASCII grid (.asc) or as the columns j,k,value (.csv). step < 0: the last.
 // staticItem > 0 exports that static item (from 1) instead: a map as above, a

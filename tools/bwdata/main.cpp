@@ -30,6 +30,7 @@ const char* kUsage =
     "[--name TEXT]\n"
     "  bwdata import-raster RASTER -o OUT.xol2 [--band N] [--projection TEXT] [--origin LON,LAT]\n"
     "                    [--name TEXT] [--type CODE] [--unit CODE] [--title TEXT]\n"
+    "  bwdata import-profile PROFILE.csv -o OUT.xol1 [--title TEXT]\n"
     "  bwdata export FILE -o OUT.csv|OUT.asc|OUT.tif [--item N] [--step N]\n"
     "  bwdata export FILE -o OUT.csv|OUT.asc|OUT.tif --static N\n"
     "  bwdata waves -o OUT.xol0|OUT.xol1 --drive level|flux|source --depth D --dt DT\n"
@@ -95,7 +96,7 @@ int main(int argc, char** argv) {
         return WavesCommand(std::vector<std::string>(argv + 2, argv + argc));
     const std::string command = argv[1], input = argv[2];
     if (command != "info" && command != "import-asc" && command != "import-csv" &&
-        command != "import-raster" && command != "export")
+        command != "import-raster" && command != "import-profile" && command != "export")
         return Fail("unknown command " + command + "\n" + kUsage);
     std::string output, start, text;
     AscOptions asc;
@@ -196,6 +197,8 @@ int main(int argc, char** argv) {
         raster.map = asc;
         if (!projectionGiven) raster.map.projection.clear();  // the raster's own CRS
         text = ImportRaster(input, output, raster);
+    } else if (command == "import-profile") {
+        text = ImportProfile(input, output, csv.title);
     } else if (command == "import-csv") {
         if (csv.start.empty()) return Fail("--start \"YYYY-MM-DD hh:mm:ss\" is missing");
         text = ImportCsv(input, output, csv);

@@ -324,3 +324,51 @@ std::string ImportCsv(const std::string& input, const std::string& output,
         return "";
     });
 }
+
+std::string ImportProfile(const std::string& input, const std::string& output,
+                          const std::string& title) {
+    std::ifstream in(input);
+    if (!in) return input + ": can't be opened";
+    std::string line;
+    int lineNo = 0;
+    std::vector<float> x, z;
+    while (std::getline(in, line)) {
+        ++lineNo;
+        line = Trimmed(line);
+        if (line.empty()) continue;
+        const auto fields = Split(line, ',');
+        double a = 0.0, b = 0.0;
+        if (x.empty() && !Number(fields[0], a)) continue;  // the header line
+        if (fields.size() != 2)
+            return Where(input, lineNo) + std::to_string(fields.size()) + " fields, not 2 (x, z)";
+        if (std::string e = BadValue(Trimmed(fields[0]), a); !e.empty())
+            return Where(input, lineNo) + e;
+        if (std::string e = BadValue(Trimmed(fields[1]), b); !e.empty())
+            return Where(input, lineNo) + e;
+        if (!x.empty() && static_cast<float>(a) <= x.back())
+            return Where(input, lineNo) + "x must rise from row to row";
+        x.push_back(static_cast<float>(a));
+        z.push_back(static_cast<float>(b));
+    }
+    if (x.size() < 2) return input + ": a profile needs at least two points";
+    // Points dx apart to the precision of the file need no table of positions.
+    const double dx = (static_cast<double>(x.back()) - x.front()) / (x.size() - 1);
+    bool even = true;
+    for (size_t i = 0; i < x.size() && even; ++i)
+        even = std::fabs(x[i] - (x.front() + i * dx)) <= 1e-5 * std::max(1.0, std::fabs(dx * i));
+    const int points = static_cast<int>(x.size());
+    return WriteData(output, [&](const std::string& part, int& status) -> std::string {
+        XolFile f = XolCreateHeader(title.empty() ? "Profile" : title, even ? 1 : 2, 1,
+                                    {.appTitle = "bwdata"}, &status);
+        if (status != 0) return "";
+        int n = 1;
+        if (!even) XolSetItem(f, n++, 999, "x", 1000, &status);
+        XolSetItem(f, n, 100079, "Bathymetry", 1000, &status);
+        XolSetAxis(f, 1, even ? static_cast<float>(dx) : 1.0f, even ? x.front() : 0.0f, points);
+        XolCreateFile(f, part, &status);
+        if (!even && status == 0) XolWriteDynamic(f, x.data(), &status);
+        if (status == 0) XolWriteDynamic(f, z.data(), &status);
+        XolClose(f);
+        return "";
+    });
+}

@@ -188,4 +188,29 @@ TEST_F(DataTool, BadInputIsNamedAndWritesNothing) {
     }
 }
 
+// A profile of the 1DH model from x and bed level: points dx apart give one
+// bed item on an axis of that spacing; uneven ones two items, the positions
+// and the bed, in the order the mesh reader takes them. x must rise.
+TEST_F(DataTool, ProfilesComeFromACsvOfXAndBedLevel) {
+    for (const auto& [csv, items, spacing] :
+         {std::tuple{"x,z\n10,-1\n10.5,-0.9\n11,-0.8\n", 1, 0.5f},
+          std::tuple{"x,bed\n0,-1\n0.5,-0.9\n2,-0.8\n4,0.5\n", 2, 1.0f}}) {
+        bwtest::WriteFile(dir / "p.csv", csv);
+        Ok({"import-profile", "p.csv", "-o", "p.xol1"});
+        XolFile f = XolOpenRead(dir / "p.xol1");
+        EXPECT_EQ(f.dimension, 1);
+        EXPECT_EQ(f.noDynamicItems, items);
+        EXPECT_EQ(f.axes[0].spacing, spacing);
+        std::vector<float> x(f.axes[0].count), z(x.size());
+        if (items == 2) XolReadDynamic(f, x.data());
+        XolReadDynamic(f, z.data());
+        XolClose(f);
+        EXPECT_EQ(z.front(), -1.0f);
+        EXPECT_EQ(z.back(), items == 1 ? -0.8f : 0.5f);
+        if (items == 2) EXPECT_EQ(x, (std::vector<float>{0, 0.5f, 2, 4}));
+    }
+    bwtest::WriteFile(dir / "back.csv", "x,z\n0,-1\n0,-2\n");
+    Refused({"import-profile", "back.csv", "-o", "b.xol1"}, "back.csv:3: x must rise");
+}
+
 }  // namespace

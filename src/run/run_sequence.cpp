@@ -6,6 +6,7 @@
 #include "input/kvt_access.hpp"
 #include "input/model_check.hpp"
 #include "input/model_setup.hpp"
+#include "meshsolver/run_mesh_solver.hpp"
 #include "run/fpmode.hpp"
 #include "run/messages.hpp"
 #include "run/process.hpp"
@@ -132,17 +133,17 @@ void RunMain(int argc, const char* const* argv) {
         StopTiming(gOverallTiming, kTaskTotal);
         Shutdown(gRun.parameterFileName, 0);
     }
-    // A 1DH model is read and its mesh solver file written; the solver that
-    // runs it is still to come.
-    if (gBasic.numberOfDimensions == 1)
-        StopRun("The 1DH mesh solver is not yet available in this version");
     // As many threads as the grid has work for and processors are idle, or
     // OMP_NUM_THREADS; the log says how many and why.
     SetRunThreads(static_cast<long long>(gGrid.Points()));
     StopTiming(gOverallTiming, kTaskPreProcessing);
 
-    // The solver hands back its exit code: 0, or -1 after a cancel.
+    // The solver hands back its exit code: 0, or -1 after a cancel (or a
+    // blow-up of the mesh solver). A 1DH model is run from the mesh solver's
+    // file that the model reader wrote; the run's name becomes that of its log.
     if (gBasic.numberOfDimensions == 2) Compute(gRun.runExitCode);
+    if (gBasic.numberOfDimensions == 1)
+        RunMeshSolver(gMeshSolverFileName, gRun.parameterFileName, gRun.runExitCode);
 
     StopTiming(gOverallTiming, kTaskTotal);
     WriteTimingReport(gOverallTiming);

@@ -1,0 +1,7 @@
+#include "meshsolver/bw_model.hpp"
+
+BwModel gBwModel;
+
+void ResetBwModel() {
+    gBwModel = BwModel{};
+}

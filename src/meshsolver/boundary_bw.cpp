@@ -10,7 +10,6 @@
 #include "meshsolver/boundary_bw.hpp"
 
 #include <algorithm>
-#include <array>
 #include <cmath>
 #include <cstdio>
 #include <string>
@@ -146,14 +145,17 @@ const BoundaryCode* CodeOfNode(const BwModel& model, const Mesh& mesh, int32_t n
     return nullptr;
 }
 
-// Value[1] = Value[0], Value[0] = the value of the code's component c.
-void ShiftValues(BoundarySet& set, const Mesh& mesh, const BwModel& model,
-                 const std::vector<std::array<double, 2>>& value, int component, double t) {
+// Value[1] = Value[0], Value[0] = the value of the code's component c at t.
+// The values are made per record, on the stack: a step allocates nothing.
+void ShiftValues(BoundarySet& set, const Mesh& mesh, const BwModel& model, int component,
+                 double t) {
     for (BoundaryNode& r : set.records) {
         const BoundaryCode* c = CodeOfNode(model, mesh, r.node);
         if (c == nullptr || c->type <= 2) continue;
+        double values[2];
+        DataInputValues(c->data, t, values);
         r.Value[1] = r.Value[0];
-        r.Value[0] = value[c - model.BoundaryCodes.data()][component];
+        r.Value[0] = values[component];
     }
     set.time = t;
 }
@@ -229,11 +231,7 @@ void SetupBoundCondBW(BwModel& model) {
 }
 
 void UpdateForcingsBW(double t, BwModel& model) {
-    std::vector<std::array<double, 2>> values(model.BoundaryCodes.size(), {0.0, 0.0});
-    for (size_t c = 0; c < model.BoundaryCodes.size(); ++c)
-        if (model.BoundaryCodes[c].type > 2)
-            DataInputValues(model.BoundaryCodes[c].data, t, values[c].data());
-    ShiftValues(model.VelocitySet, gMeshes.meshes[model.VelocityMesh], model, values, 0, t);
-    ShiftValues(model.ElevationSet, gMeshes.meshes[model.ElevationMesh], model, values, 0, t);
-    ShiftValues(model.AuxSet, gMeshes.meshes[model.AuxMesh], model, values, 1, t);
+    ShiftValues(model.VelocitySet, gMeshes.meshes[model.VelocityMesh], model, 0, t);
+    ShiftValues(model.ElevationSet, gMeshes.meshes[model.ElevationMesh], model, 0, t);
+    ShiftValues(model.AuxSet, gMeshes.meshes[model.AuxMesh], model, 1, t);
 }

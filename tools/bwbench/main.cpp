@@ -3,7 +3,8 @@
 // the table gives the points computed per CPU second and per wall second
 // (the CPS of the run statistics), next to the bandwidth of a plain copy of
 // arrays of the same size measured in the same run, and the bytes a step
-// moves per point by count of the arrays it reads and writes.
+// moves per point by count of the arrays it reads and writes. The last table
+// is the 1DH mesh solver on flumes (flume1d.cpp).
 #include <omp.h>
 
 #include <algorithm>
@@ -14,6 +15,7 @@
 #include <vector>
 
 #include "data/tsfunc.hpp"
+#include "flume1d.hpp"
 #include "output/statistics.hpp"
 #include "processes/friction.hpp"
 #include "processes/internal_generation.hpp"
@@ -227,6 +229,11 @@ void ProcessTable(int32_t n, double scale) {
 int main(int argc, char** argv) {
     gProcess.processorCount = omp_get_num_procs();
     gProcess.maxThreads = omp_get_max_threads();
+    // bwbench 1dh [scale [nodes]]: only the table of the 1DH flumes.
+    if (argc > 1 && std::string(argv[1]) == "1dh") {
+        FlumeTable(argc > 2 ? std::atof(argv[2]) : 1.0, argc > 3 ? std::atoi(argv[3]) : 0);
+        return 0;
+    }
     // bwbench [scale [n [family [threads]]]]: a shorter run for tests, or one
     // grid size (any n), sweep family (0 central, 1 and 2 upwind) and thread
     // count to profile; bwbench scale n processes: the table of the processes alone.
@@ -276,5 +283,7 @@ int main(int argc, char** argv) {
         }
     }
     if (onlyHandle < 0) ProcessTable(onlyN > 0 ? onlyN : 500, scale);
+    // The whole bench (no grid size given) ends with the 1DH flumes.
+    if (onlyN <= 0) FlumeTable(scale, 0);
     return 0;
 }

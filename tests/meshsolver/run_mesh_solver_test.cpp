@@ -60,21 +60,7 @@ protected:
         bwtest::WriteSeriesFile(dir / "q.xol0", "2004-01-01 00:00:00", 1.0,
                                 {std::vector<float>(records, q)});
     }
-    static Sections Model(Sections given) {
-        Sections s = {
-            {"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\nDELETE_FEM_KVT_FILE = 0\n"},
-            {"SURFACE_ELEVATION", "-"},
-            {"Output_Deterministic_2D", "-"},
-            {"Output_Statistic_2D", "-"},
-            {"Output_Disturbance_2D", "-"},
-            {"Output_Hotstart_2D", "-"},
-            {"OUTPUT_DETERMINISTIC_1D", "Number_Of_Records = 0\n"},
-            {"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\n"},
-            {"OUTPUT_MOVING_SHORELINE_1D", "INCLUDE_CALCULATION = false\n"},
-        };
-        for (auto& [name, body] : given) s[name] = body;
-        return s;
-    }
+    static Sections Model(Sections given) { return bwtest::ProfileSections(std::move(given)); }
     bwtest::RunResult Run(const Sections& given, bool check = false) {
         bwtest::WriteFile(dir / "m.bw", bwtest::ModelText("line.xol1", Model(given)));
         std::vector<std::string> argv = {bwtest::BuiltProgram("bw")};

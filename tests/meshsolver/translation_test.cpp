@@ -111,21 +111,7 @@ protected:
 
     // A 1DH model: the sections of the grid model that one dimension does not
     // read are left out, the outputs of one dimension are there.
-    static Sections Model(Sections given) {
-        Sections s = {
-            {"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\nDELETE_FEM_KVT_FILE = 0\n"},
-            {"SURFACE_ELEVATION", "-"},
-            {"Output_Deterministic_2D", "-"},
-            {"Output_Statistic_2D", "-"},
-            {"Output_Disturbance_2D", "-"},
-            {"Output_Hotstart_2D", "-"},
-            {"OUTPUT_DETERMINISTIC_1D", "Number_Of_Records = 0\n"},
-            {"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\n"},
-            {"OUTPUT_MOVING_SHORELINE_1D", "INCLUDE_CALCULATION = false\n"},
-        };
-        for (auto& [name, body] : given) s[name] = body;
-        return s;
-    }
+    static Sections Model(Sections given) { return bwtest::ProfileSections(std::move(given)); }
 
     bwtest::RunResult Run(const Sections& given, bool check = true,
                           const std::string& bathymetry = "line.xol1") {

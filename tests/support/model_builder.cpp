@@ -84,6 +84,22 @@ std::vector<float> RampedSine(double a, double T, double dt, size_t count, doubl
     return v;
 }
 
+std::map<std::string, std::string> ProfileSections(std::map<std::string, std::string> given) {
+    std::map<std::string, std::string> s = {
+        {"BASIC_MODEL_PARAMETERS", "NUMBER_OF_DIMENSIONS = 1\nDELETE_FEM_KVT_FILE = 0\n"},
+        {"SURFACE_ELEVATION", "-"},
+        {"Output_Deterministic_2D", "-"},
+        {"Output_Statistic_2D", "-"},
+        {"Output_Disturbance_2D", "-"},
+        {"Output_Hotstart_2D", "-"},
+        {"OUTPUT_DETERMINISTIC_1D", "Number_Of_Records = 0\n"},
+        {"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\n"},
+        {"OUTPUT_MOVING_SHORELINE_1D", "INCLUDE_CALCULATION = false\n"},
+    };
+    for (auto& [name, body] : given) s[name] = body;
+    return s;
+}
+
 std::string GenerationRecord(int n, int j1, int k1, int j2, int k2, int waveType,
                              const std::string& file) {
     std::ostringstream s;
@@ -149,7 +165,8 @@ DataFile ReadDataFile(const std::string& path) {
     for (int a = 0; a < f.dimension; ++a) points *= static_cast<size_t>(f.axes[a].count);
     std::vector<float> skip(points);
     if (f.noStaticItems > 0) d.firstStatic.resize(points);
-    for (int s = 0; s < f.noStaticItems; ++s) XolReadStatic(f, s ? skip.data() : d.firstStatic.data());
+    for (int s = 0; s < f.noStaticItems; ++s)
+        XolReadStatic(f, s ? skip.data() : d.firstStatic.data());
     d.records.resize(static_cast<size_t>(std::max(f.noTimeSteps, 0)));
     for (auto& record : d.records) {
         record.assign(static_cast<size_t>(f.noDynamicItems), std::vector<float>(points));

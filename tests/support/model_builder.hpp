@@ -52,6 +52,11 @@ std::vector<float> RampedSine(double a, double T, double dt, size_t count, doubl
 std::string ModelText(const std::string& bathymetryFile,
                       const std::map<std::string, std::string>& sections = {});
 
+// The sections of a 1DH model over those of `given`: one dimension, the
+// sections of the grid model that a profile does not read left out, its three
+// output sections without records.
+std::map<std::string, std::string> ProfileSections(std::map<std::string, std::string> given = {});
+
 // The body of a DATA_FILE section naming a file with item 1.
 std::string DataFileSection(const std::string& file, int item = 1);
 // One INTERNAL_GEN_DATA_n record: the line (j1,k1)..(j2,k2) fed by items 1

@@ -4,6 +4,7 @@
 #include "meshsolver/processes_bw.hpp"
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <cmath>
 #include <numbers>
@@ -253,11 +254,16 @@ TEST(ReadNodeMapBW, ItemOnTheNodesOfTheMesh) {
     testing::internal::CaptureStdout();
     EXPECT_EQ(ReadNodeMapBW(dir / "map.xol1", 2, line), (std::vector<double>{0.0, 4.0, 5.0, 6.0}));
     testing::internal::GetCapturedStdout();
-    EXPECT_EXIT(ReadNodeMapBW(dir / "map.xol1", 3, line), testing::ExitedWithCode(1), "");
-    EXPECT_EXIT(ReadNodeMapBW(dir / "none.xol1", 1, line), testing::ExitedWithCode(1), "");
+    // The stop is written to the screen: here onto standard error, where the
+    // death test reads it.
+    EXPECT_EXIT((dup2(2, 1), ReadNodeMapBW(dir / "map.xol1", 3, line)), testing::ExitedWithCode(1),
+                "Wrong data file");
+    EXPECT_EXIT((dup2(2, 1), ReadNodeMapBW(dir / "none.xol1", 1, line)), testing::ExitedWithCode(1),
+                "Illegal data file");
     Mesh longer;
     AllocateMesh(longer, 4, 3, 2, "test");
-    EXPECT_EXIT(ReadNodeMapBW(dir / "map.xol1", 1, longer), testing::ExitedWithCode(1), "");
+    EXPECT_EXIT((dup2(2, 1), ReadNodeMapBW(dir / "map.xol1", 1, longer)),
+                testing::ExitedWithCode(1), "Wrong data file");
 }
 
 // A line of n nodes 1 m apart and its quadratic refinement.

@@ -1,6 +1,6 @@
 // The mesh solver's file of a 1DH model: the engine reads a model file of
-// one dimension, writes "<model file>_FEM.kvt" beside it and stops (the
-// solver is still to come); -check ends normally once the file is written.
+// one dimension and writes "<model file>_FEM.kvt" beside it, which the run
+// then reads; -check ends normally once the file is written.
 // The file is loaded back with the parameter library and its values are
 // compared with what the model file says.
 #include <gtest/gtest.h>

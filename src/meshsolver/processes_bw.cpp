@@ -36,6 +36,24 @@ void NodeVector(std::vector<double>& v, const Mesh& mesh, double value) {
     v.assign(static_cast<size_t>(mesh.NodeCount) + 1, value);
 }
 
+// The map file and item the open section names.
+struct MapKeys {
+    std::string file;
+    int32_t item = 1;
+};
+MapKeys ReadMapKeys() {
+    MapKeys k;
+    KvtGetFilename("file_name", k.file);
+    KvtGetInteger("item_number", k.item);
+    return k;
+}
+
+// The map the open section names, on the nodes of mesh.
+std::vector<double> ReadSectionMap(const Mesh& mesh) {
+    const MapKeys k = ReadMapKeys();
+    return ReadNodeMapBW(k.file, k.item, mesh);
+}
+
 void SpecDepthBW(BwModel& model) {
     const Mesh& mesh = MeshOf(model.ElevationMesh);
     KvtOpenSection("DEPTH");
@@ -81,11 +99,7 @@ void SpecResistanceBW(BwModel& model) {
         if (format != 0 && format != 2) StopRun("Format not supported for resistance coef.");
         std::vector<double> value(model.Resistance.size(), 0.0);
         if (format == 2) {
-            std::string file;
-            int32_t item = 1;
-            KvtGetFilename("file_name", file);
-            KvtGetInteger("item_number", item);
-            value = ReadNodeMapBW(file, item, MeshOf(model.GeometryMesh));
+            value = ReadSectionMap(MeshOf(model.GeometryMesh));
         } else {
             double constant = 0.0;
             KvtGetDouble("constant_value", constant);
@@ -114,11 +128,7 @@ void SpecPorosityBW(BwModel& model) {
     model.porosityType = 0;
     KvtGetInteger("type", model.porosityType);
     if (model.porosityType > 0) {
-        std::string file;
-        int32_t item = 1;
-        KvtGetFilename("file_name", file);
-        KvtGetInteger("item_number", item);
-        model.Porosity = ReadNodeMapBW(file, item, MeshOf(model.ElevationMesh));
+        model.Porosity = ReadSectionMap(MeshOf(model.ElevationMesh));
         double alpha = 1000.0, beta = 2.8, viscosity = 1.4e-6, diameter = 0.2;
         KvtGetDouble("particle_coef_alpha", alpha);
         KvtGetDouble("particle_coef_beta", beta);
@@ -135,10 +145,7 @@ void SetupSponge(BwModel& model) {
     model.spongeType = 0;
     KvtGetInteger("type", model.spongeType);
     if (model.spongeType > 0) {
-        std::string file;
-        int32_t item = 1;
-        KvtGetFilename("file_name", file);
-        KvtGetInteger("item_number", item);
+        const MapKeys map = ReadMapKeys();
         // A line has two ends: a reference for each, of which the file gives the first.
         double velocity[2] = {0.0, 0.0};
         int status = 0;
@@ -146,7 +153,7 @@ void SetupSponge(BwModel& model) {
         model.spongeReference[0] = model.spongeReference[1] = 0.0;
         KvtGetDoubleList("reference_elevation", model.spongeReference, 2, &status);
         const Mesh& geometry = MeshOf(model.GeometryMesh);
-        std::vector<double> s = ReadNodeMapBW(file, item, geometry);
+        std::vector<double> s = ReadNodeMapBW(map.file, map.item, geometry);
         for (double& v : s) v = std::fabs(v);
         model.spongeVelocity = SpreadByElementsBW(s, geometry, MeshOf(model.VelocityMesh));
         model.spongeElevation = SpreadByElementsBW(s, geometry, MeshOf(model.ElevationMesh));
@@ -192,12 +199,8 @@ void SetupFilter(BwModel& model) {
     model.filterType = 0;
     KvtGetInteger("type", model.filterType);
     if (model.filterType > 0) {
-        std::string file;
-        int32_t item = 1;
-        KvtGetFilename("file_name", file);
-        KvtGetInteger("item_number", item);
         const Mesh& geometry = MeshOf(model.GeometryMesh);
-        const std::vector<double> c = ReadNodeMapBW(file, item, geometry);
+        const std::vector<double> c = ReadSectionMap(geometry);
         model.filterVelocity = SpreadByElementsBW(c, geometry, MeshOf(model.VelocityMesh));
         model.filterElevation = SpreadByElementsBW(c, geometry, MeshOf(model.ElevationMesh));
     }

@@ -10,6 +10,7 @@
 #include "input/kvt_current.hpp"
 #include "meshsolver/boundary_bw.hpp"
 #include "meshsolver/equations_bw.hpp"
+#include "meshsolver/processes_bw.hpp"
 #include "run/messages.hpp"
 
 namespace {
@@ -139,8 +140,9 @@ void SolveTimeStepBW(double t, BwModel& model, int32_t& status) {
         default:
             StopRun("SetupDaes: wrong time integration method");
     }
-    // With breaking on, the rollers of the finished step become the old
-    // ones here (SaveBreakingBW), once breaking is switched on in 1DH.
+    // The rollers of the finished step become the old ones: the next step's
+    // angles relax from them.
+    if (model.Breaking.type > 0) SaveBreakingBW(model.Breaking);
     StopTask(model, 6);
 }
 

@@ -443,7 +443,6 @@ void CalcRhsBW(double t, double stageStep, const std::vector<double>& y, std::ve
 
 void UpdateStageBW(double t, double stageStep, std::vector<double>& y, BwModel& model,
                    int32_t& status) {
-    (void)stageStep;
     status = 0;
     const BoundarySet& vset = model.VelocitySet;
     for (const BoundaryNode& rec : vset.records) {
@@ -465,8 +464,8 @@ void UpdateStageBW(double t, double stageStep, std::vector<double>& y, BwModel& 
         SolveBGE(model.Les.AuxMatrix, rhs.data() + 1, model.AuxVariable.data() + 1, flag, info);
     }
 
-    // The sponge layer and then the explicit filter act here on both blocks
-    // of y, once they are switched on in the 1DH model.
+    if (model.spongeType > 0) ApplySpongeBW(model, y);
+    if (model.filterType > 0) ApplyFilterBW(model, y);
 
     const int32_t nu = model.ElevationStart - 1;
     const int32_t ne = model.StateSize - nu;
@@ -478,8 +477,12 @@ void UpdateStageBW(double t, double stageStep, std::vector<double>& y, BwModel& 
     std::copy(y.begin() + model.ElevationStart, y.begin() + model.ElevationStart + ne,
               model.Elevation.begin() + 1);
 
-    // The rollers are renewed here with the stage step, once breaking is
-    // switched on in the 1DH model.
+    // The rollers of this stage, from the surface just set; the angles
+    // relax from those of the last step by the stage step.
+    if (model.Breaking.type > 0)
+        CalcBreakingBW(model.Breaking, gMeshes.meshes[model.GeometryMesh], stageStep,
+                       model.Elevation.data(), model.ElevationRate.data(), model.StillDepth,
+                       model.TotalDepth);
 }
 
 void CalcAuxMatrixBW(BwModel& model) {

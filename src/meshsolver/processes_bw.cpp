@@ -59,11 +59,15 @@ void SpecDepthBW(BwModel& model) {
     KvtOpenSection("DEPTH");
     model.depthType = 0;
     KvtGetInteger("type", model.depthType);
+    if (model.depthType == 1) {
+        // A map of the still water depth d (positive in water) on the nodes.
+        model.StillDepth = ReadSectionMap(mesh);
+    } else if (model.depthType == 0) {
+        NodeVector(model.StillDepth, mesh, 0.0);
+        for (int32_t i = 1; i <= mesh.NodeCount; ++i) model.StillDepth[i] = -mesh.z[i];
+    }
     KvtCloseSection();
-    if (model.depthType == 1) StopRun(kMeshSolverNotAvailable);  // a depth map
-    if (model.depthType != 0) StopRun("Wrong depth type");
-    NodeVector(model.StillDepth, mesh, 0.0);
-    for (int32_t i = 1; i <= mesh.NodeCount; ++i) model.StillDepth[i] = -mesh.z[i];
+    if (model.depthType != 0 && model.depthType != 1) StopRun("Wrong depth type");
     NodeVector(model.TotalDepth, mesh, 0.0);
     WriteSimulationInformation(mesh, model.StillDepth, model.TimeStep);
 }
@@ -287,9 +291,6 @@ void SetupProcessesBW(BwModel& model) {
     SetupSponge(model);
     SpecBreakingBW(model);
     SetupFilter(model);
-    // The sponge, the filter and the rollers are not yet applied in the stages.
-    if (model.spongeType > 0 || model.Breaking.type > 0 || model.filterType > 0)
-        StopRun(kMeshSolverNotAvailable);
 }
 
 std::vector<double> ReadNodeMapBW(const std::string& path, int32_t item, const Mesh& mesh) {
@@ -412,8 +413,8 @@ void CalcBreakingBW(BreakingStateBW& b, const Mesh& mesh, double stageStep, cons
 }
 
 void SaveBreakingBW(BreakingStateBW& b) {
-    b.deltaOld = b.delta;
-    b.tanPhiOld = b.tanPhi;
+    std::copy(b.delta.begin(), b.delta.end(), b.deltaOld.begin());
+    std::copy(b.tanPhi.begin(), b.tanPhi.end(), b.tanPhiOld.begin());
 }
 
 void SetDepthBW(int32_t n, std::vector<double>& h, const std::vector<double>& d, const double* eta,
@@ -472,7 +473,9 @@ void SetupInitCondBW(BwModel& model) {
     KvtGetInteger("type", model.startType);
     if (model.startType == 0) KvtGetDoubleList("constant_values", model.startValues, 2);
     KvtCloseSection();
-    if (model.startType != 0) StopRun(kMeshSolverNotAvailable);
+    // The model reader starts every 1DH run from rest; a start from maps
+    // has no way into the mesh solver's file.
+    if (model.startType != 0) StopRun("SpecInitCondBW: Type of starting conditions not supported");
 
     NodeVector(model.Flux, MeshOf(model.VelocityMesh), model.startValues[0]);
     NodeVector(model.Elevation, MeshOf(model.ElevationMesh), model.startValues[1]);

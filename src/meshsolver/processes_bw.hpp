@@ -1,9 +1,9 @@
 // The processes of the 1DH model that act on the nodes: the still water
 // depth d and the total depth h = d + eta with its blow-up check, the slot
 // that keeps a dry node wet (storage width b), and the start state.
-// Slot, bed resistance and porosity are in force; the sponge, the filter and
-// the rollers read their sections and maps here, but a run that switches
-// one of them on stops before its first step.
+// The sponge, the filter and the rollers read their sections and maps here
+// and act after each stage of the integrator; bed resistance and porosity
+// act in the element equations.
 #pragma once
 
 #include <cstdint>

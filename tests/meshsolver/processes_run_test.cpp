@@ -1,0 +1,205 @@
+// The processes of a 1DH run against theory, each from a model file: waves
+// made on a generation node inside the flume, absorbed by sponge layers at
+// both ends; linear shoaling on a mild slope.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstdio>
+#include <vector>
+
+#include "meshsolver/profile_run.hpp"
+
+namespace {
+
+using bwtest::kTwoPi;
+
+constexpr double kB = 1.0 / 15.0;
+
+std::string DeepTerms() {
+    return "Deep_Water_Terms = true\nDispersion_Factor = 0.0666666667\n";
+}
+
+// A sponge of `width` m at both ends of a line of n + 1 points dx apart,
+// rising quadratically from 1 to `end` at the walls.
+std::vector<float> SpongeMap(int n, double dx, double width, double end) {
+    std::vector<float> s(n + 1, 1.0f);
+    for (int j = 0; j <= n; ++j) {
+        const double in = std::min(j * dx, (n - j) * dx);
+        if (in < width)
+            s[j] = static_cast<float>(1.0 + (end - 1.0) * std::pow(1.0 - in / width, 2));
+    }
+    return s;
+}
+
+// The amplitude of the surface at each node over the last periods of a run,
+// and the reflection coefficient (Hmax - Hmin) / (Hmax + Hmin) of the
+// envelope over a stretch of nodes.
+struct Envelope {
+    std::vector<double> amplitude;  // 1-based nodes
+    double Reflection(int32_t from, int32_t to) const {
+        double hi = 0.0, lo = 1e30;
+        for (int32_t i = from; i <= to; ++i) {
+            hi = std::max(hi, amplitude[i]);
+            lo = std::min(lo, amplitude[i]);
+        }
+        return (hi - lo) / (hi + lo);
+    }
+    double Mean(int32_t from, int32_t to) const {
+        double m = 0.0;
+        for (int32_t i = from; i <= to; ++i) m += amplitude[i];
+        return m / (to - from + 1);
+    }
+};
+
+// Runs steps 1..steps, fitting the surface of every node over the last
+// `periods` periods of T.
+Envelope RunAndFit(int32_t steps, double dt, double T, int32_t periods) {
+    const int32_t n = static_cast<int32_t>(gBwModel.Elevation.size()) - 1;
+    const int32_t from = steps - static_cast<int32_t>(std::lround(periods * T / dt)) + 1;
+    std::vector<std::vector<double>> series(n + 1);
+    const bool ok = bwtest::StepProfileRun(1, steps, dt, [&](int32_t s) {
+        if (s < from) return;
+        for (int32_t i = 1; i <= n; ++i) series[i].push_back(gBwModel.Elevation[i]);
+    });
+    EXPECT_TRUE(ok) << "the run blew up";
+    Envelope e;
+    e.amplitude.assign(n + 1, 0.0);
+    for (int32_t i = 1; i <= n && ok; ++i)
+        e.amplitude[i] = bwtest::FitSine(series[i], dt, kTwoPi / T).amplitude;
+    return e;
+}
+
+// The amplitude a source of flux amplitude Q makes on each side, by linear
+// theory of the equations: a = Q / (cg (1 + (B + 1/3)(kd)^2)), which is Q / c
+// without the deep-water terms.
+double SourceAmplitude(double Q, double T, double d, double B) {
+    const double k = bwtest::WaveNumberOf(T, d, B), dk = 1e-6 * k;
+    const auto omega = [&](double kk) {
+        const double kd2 = kk * d * kk * d;
+        return std::sqrt(9.81 * d * kk * kk * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
+    };
+    const double cg = (omega(k + dk) - omega(k - dk)) / (2.0 * dk);
+    return Q / (cg * (1.0 + (B + 1.0 / 3.0) * k * d * k * d));
+}
+
+// A generation node in the middle of a flume of 1 m water sends a wave of
+// the amplitude of linear theory both ways; the sponge layers at the walls
+// take them out, so that the envelope in front of each is flat.
+TEST(GenerationAndSponge, WavesLeaveTheSourceBothWaysAtTheAmplitudeOfTheoryAndAreAbsorbed) {
+    struct Case {
+        double B, T;
+        bool deep;
+    };
+    for (const Case& w : {Case{kB, 2.0, true}, Case{0.0, 4.0, false}}) {
+        SCOPED_TRACE(w.T);
+        const double d = 1.0, a = 0.005;
+        const double k = bwtest::WaveNumberOf(w.T, d, w.B), L = kTwoPi / k, c = L / w.T;
+        const int perWavelength = 25, perPeriod = 40;
+        const double dx = L / perWavelength, dt = w.T / perPeriod;
+        const int n = 14 * perWavelength, source = n / 2;  // 2 L of sponge, 5 L free a side
+        const double sponge = 2.0 * L, Q = a * c;
+
+        bwtest::TempDir dir;
+        bwtest::WriteProfile(dir / "bed.xol1", dx,
+                             std::vector<float>(n + 1, -static_cast<float>(d)));
+        bwtest::WriteProfile(dir / "sponge.xol1", dx, SpongeMap(n, dx, sponge, 1.5), "Sponge");
+        const int32_t steps = 26 * perPeriod;
+        bwtest::WriteSeriesFile(
+            dir / "gen.xol0", "2004-01-01 00:00:00", dt,
+            {bwtest::RampedSine(Q, w.T, dt, steps + 2, 3.0), std::vector<float>(steps + 2, 0.0f)});
+        bwtest::SetUpProfileRun(
+            dir, dt,
+            {{"Equation_Parameters",
+              w.deep ? DeepTerms() : "Deep_Water_Terms = false\nDispersion_Factor = 0\n"},
+             {"Internal_Generation",
+              "Number_Of_Records = 1\n" +
+                  bwtest::GenerationRecord(1, source, 0, source, 0, 0, "gen.xol0")},
+             {"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("sponge.xol1")}});
+        if (HasFatalFailure()) return;
+
+        const Envelope e = RunAndFit(steps, dt, w.T, 4);
+        const double theory = SourceAmplitude(Q, w.T, d, w.B);
+        // Nodes are 1-based: grid index j is node j + 1. A wavelength clear
+        // of the source and of the sponge on either side.
+        const int32_t spongeNodes = static_cast<int32_t>(sponge / dx);
+        const int32_t leftFrom = spongeNodes + 2, leftTo = source + 1 - perWavelength;
+        const int32_t rightFrom = source + 1 + perWavelength, rightTo = n - spongeNodes;
+        for (auto [from, to] : {std::pair{leftFrom, leftTo}, std::pair{rightFrom, rightTo}}) {
+            const double kr = e.Reflection(from, to);
+            std::printf(
+                "T %.1f, nodes %d..%d: amplitude %+.2f %% off theory, reflected energy "
+                "%.3f %%\n",
+                w.T, from, to, 100.0 * (e.Mean(from, to) / theory - 1.0), 100.0 * kr * kr);
+            EXPECT_NEAR(e.Mean(from, to) / theory, 1.0, 0.03) << from;
+            EXPECT_LT(kr * kr, 0.05) << from;
+        }
+    }
+}
+
+// The group velocity of the equations' relation.
+double GroupVelocity(double T, double d, double B) {
+    const double k = bwtest::WaveNumberOf(T, d, B), dk = 1e-6 * k;
+    const auto omega = [&](double kk) {
+        const double kd2 = kk * d * kk * d;
+        return std::sqrt(9.81 * d * kk * kk * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
+    };
+    return (omega(k + dk) - omega(k - dk)) / (2.0 * dk);
+}
+
+// Waves from a source in 0.5 m of water climb a slope of 1:50 onto a shelf of
+// 0.2 m, with sponges behind the source and at the end of the shelf. The
+// height follows the conservation of the energy flux a^2 cg with cg of the
+// equations' relation, over the slope and on the shelf.
+TEST(Shoaling, HeightOnAMildSlopeKeepsTheEnergyFluxOfTheRelation) {
+    const double T = 1.5, a = 0.002, d0 = 0.5, d1 = 0.2, slope = 1.0 / 50.0;
+    const double L0 = kTwoPi / bwtest::WaveNumberOf(T, d0, kB);
+    const double L1 = kTwoPi / bwtest::WaveNumberOf(T, d1, kB);
+    const double dx = L1 / 25.0, dt = T / 40.0;
+    const double sponge = 2.0 * L0, toe = sponge + 2.5 * L0, top = toe + (d0 - d1) / slope;
+    const double end = top + 3.0 * L1 + sponge;
+    const int n = static_cast<int>(std::ceil(end / dx)), source = static_cast<int>(sponge / dx) + 5;
+    std::vector<float> bed(n + 1), sponges(n + 1, 1.0f);
+    for (int j = 0; j <= n; ++j) {
+        const double x = j * dx;
+        bed[j] = -static_cast<float>(std::clamp(d0 - (x - toe) * slope, d1, d0));
+        const double in = std::min(x, end - x);
+        if (in < sponge)
+            sponges[j] = static_cast<float>(1.0 + 0.5 * std::pow(1.0 - in / sponge, 2));
+    }
+    bwtest::TempDir dir;
+    bwtest::WriteProfile(dir / "bed.xol1", dx, bed);
+    bwtest::WriteProfile(dir / "sponge.xol1", dx, sponges, "Sponge");
+    const int32_t steps = 40 * 40;
+    const double Q = a * L0 / T;
+    bwtest::WriteSeriesFile(
+        dir / "gen.xol0", "2004-01-01 00:00:00", dt,
+        {bwtest::RampedSine(Q, T, dt, steps + 2, 3.0), std::vector<float>(steps + 2, 0.0f)});
+    bwtest::SetUpProfileRun(
+        dir, dt,
+        {{"Equation_Parameters", DeepTerms()},
+         {"Internal_Generation",
+          "Number_Of_Records = 1\n" +
+              bwtest::GenerationRecord(1, source, 0, source, 0, 0, "gen.xol0")},
+         {"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("sponge.xol1")}});
+    if (HasFatalFailure()) return;
+    const Envelope e = RunAndFit(steps, dt, T, 4);
+
+    // The incoming amplitude in front of the toe, then a wavelength's mean
+    // around each place against a0 sqrt(cg0 / cg).
+    const auto node = [&](double x) { return static_cast<int32_t>(std::lround(x / dx)) + 1; };
+    const auto around = [&](double x, double L) {
+        return e.Mean(node(x - L / 2.0), node(x + L / 2.0));
+    };
+    const double a0 = around(toe - L0, L0), cg0 = GroupVelocity(T, d0, kB);
+    for (double x : {toe + 0.5 * (top - toe), top + 1.5 * L1}) {
+        const double depth = std::clamp(d0 - (x - toe) * slope, d1, d0);
+        const double L = kTwoPi / bwtest::WaveNumberOf(T, depth, kB);
+        const double theory = a0 * std::sqrt(cg0 / GroupVelocity(T, depth, kB));
+        std::printf("depth %.3f m: amplitude %.5f, theory %.5f (%+.2f %%), a0 %.5f\n", depth,
+                    around(x, L), theory, 100.0 * (around(x, L) / theory - 1.0), a0);
+        EXPECT_NEAR(around(x, L) / theory, 1.0, 0.03) << depth;
+    }
+}
+
+}  // namespace

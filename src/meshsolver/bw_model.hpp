@@ -144,6 +144,11 @@ struct BwModel {
     std::vector<double> filterVelocity, filterElevation;  // coefficients
     BreakingStateBW Breaking;
 
+    // Work vectors of the output, on the elevation mesh, refreshed before
+    // each output: the bed level -d, the flux at the element ends, the
+    // second flux (two horizontal dimensions only) and eta - delta.
+    std::vector<double> BedLevel, NodalFlux, NodalFluxQ, ElevationBelowRoller;
+
     // Start state and boundaries.
     int32_t startType = 0;
     double startValues[2] = {0.0, 0.0};

@@ -1,7 +1,8 @@
 // The driver of the mesh solver: the solver file written by the model
 // reader is opened, the time axis, the meshes and the Boussinesq module are
 // set up from it, and the loop advances the state one call of the
-// integrator a step, with progress, cancel and the run statistics.
+// integrator a step, with output after each step, progress, cancel and the
+// run statistics.
 #include "meshsolver/run_mesh_solver.hpp"
 
 #include <cstdio>
@@ -10,10 +11,12 @@
 #include "equations/time_integrators.hpp"
 #include "input/kvt_access.hpp"
 #include "input/kvt_current.hpp"
+#include "mesh/output_domain.hpp"
 #include "mesh/space_discretization.hpp"
 #include "meshsolver/boundary_bw.hpp"
 #include "meshsolver/bw_model.hpp"
 #include "meshsolver/equations_bw.hpp"
+#include "meshsolver/output_bw.hpp"
 #include "meshsolver/processes_bw.hpp"
 #include "platform/kvt/kvt.hpp"
 #include "run/messages.hpp"
@@ -22,18 +25,6 @@
 MeshRunState gMeshRun;
 
 namespace {
-
-// Output files of the mesh solver are still to come: a file that asks for
-// some stops the run once the setup has read everything else.
-int32_t CountOutputFilesBW() {
-    int32_t count = 0;
-    int status = 0;
-    KvtOpenSection("OUTPUT", kKvtNoNumber, &status);
-    if (status != 0) return 0;
-    KvtGetInteger("number_of_output_files", count);
-    KvtCloseSection();
-    return count;
-}
 
 void CreateShortWaveTiming(TimingGroup& group) {
     InitTiming(group, "Short Wave Simulation", 6);
@@ -72,6 +63,10 @@ bool RunTimeLoop(int32_t& runStatus) {
     StartTiming(gOverallTiming, kTaskPreProcessing);
     r.CurrentStep = r.FirstStep;
     r.CurrentTime = r.FirstStep * r.TimeStepInterval;
+    // The start state is output like any other step.
+    OutputListBW& output = gOutputBW;
+    OpenOutputFiles(output.count, output.files);
+    WriteOutputHD3D(r.CurrentStep, output.count, output.files, gBwModel);
     // Both value slots of the boundary data hold the start value after the
     // first step's update.
     UpdateForcingsBW(r.CurrentTime, gBwModel);
@@ -92,6 +87,11 @@ bool RunTimeLoop(int32_t& runStatus) {
         }
         SolveTimeStepBW(r.CurrentTime, gBwModel, runStatus);
         if (runStatus < 0) break;
+        StopTiming(gOverallTiming, kTaskCalculation);
+        StartTiming(gOverallTiming, kTaskPostProcessing);
+        WriteOutputHD3D(r.CurrentStep, output.count, output.files, gBwModel);
+        StopTiming(gOverallTiming, kTaskPostProcessing);
+        StartTiming(gOverallTiming, kTaskCalculation);
         ReportProgress(r.CurrentStep, nodes, runStatus);
         if (runStatus < 0) break;
         StopTiming(gOverallTiming, kTaskCalculation);
@@ -100,6 +100,9 @@ bool RunTimeLoop(int32_t& runStatus) {
 
     StartTiming(gOverallTiming, kTaskPostProcessing);
     WriteLine("COMPUTATION ENDED");
+    // A run that ends early closes every file with one more block.
+    if (runStatus != 0) WriteOutputHD3D(-1, output.count, output.files, gBwModel);
+    CloseOutputFiles(output.count, output.files);
     WriteTimingReport(gBwModel.Timing);
     WriteRunStatisticsBW();
     StopTiming(gOverallTiming, kTaskPostProcessing);
@@ -131,10 +134,9 @@ void SetupBW(int32_t dimensions) {
     SetupProcessesBW(model);
     SetupInitCondBW(model);
     SetupBoundCondBW(model);
-    const int32_t outputFiles = CountOutputFilesBW();
+    SetupOutputBW(model);
     SetupSolutionBW(model);
     KvtCloseSection();
-    if (outputFiles > 0) StopRun(kMeshSolverNotAvailable);
     CreateShortWaveTiming(model.Timing);
 }
 

@@ -1,6 +1,6 @@
 // The run of a 1DH model: opens the mesh solver's file, sets up time, meshes
 // and the Boussinesq module, runs the time loop with progress and cancel,
-// and writes the run statistics.
+// writes the output files and the run statistics.
 #pragma once
 
 #include <cstdint>

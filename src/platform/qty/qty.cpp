@@ -6,7 +6,16 @@
 
 namespace {
 
-enum class Dimension { None, Length, PerLength, Time, Velocity, FluxPerWidth, Ratio };
+enum class Dimension {
+    None,
+    Length,
+    PerLength,
+    Time,
+    Velocity,
+    FluxPerWidth,
+    Ratio,
+    StressPerDensity
+};
 
 struct UnitRecord {
     int code;
@@ -34,7 +43,12 @@ constexpr UnitRecord kUnits[] = {
     {2002, "knot", "kt", Dimension::Velocity, 1852.0 / 3600.0},
     {4700, "m^3/s/m", "m2 s-1", Dimension::FluxPerWidth, 1.0},
     {4701, "ft^3/s/ft", "ft2 s-1", Dimension::FluxPerWidth, 0.3048 * 0.3048},
+    // Radiation stress divided by the density of water.
+    {5100, "m^3/s^2", "m3 s-2", Dimension::StressPerDensity, 1.0},
     {99000, "()", "1", Dimension::Ratio, 1.0},
+    // The coefficients of the mesh solver's output (sponge, filter, auxiliary
+    // variable); a file read back names them "1", as 99000.
+    {5000, "coefficient", "1", Dimension::Ratio, 1.0},
 };
 
 struct TypeRecord {
@@ -52,10 +66,12 @@ const TypeRecord kTypes[] = {
     {100097, "Significant Wave Height", {1000, 1003}},
     {100106, "Wave Height Ratio", {99000}},
     {100107, "Time", {1400, 1401, 1402, 1403}},
+    {100109, "Radiation Stress", {5100}},
     {100280, "Water Depth", {1000, 1003}},
     {100294, "Wave Skewness", {99000}},
     {100296, "Wave Asymmetry", {99000}},
     {100297, "Wave Kurtosis", {99000}},
+    {100298, "Coefficient", {5000, 99000}},
     {100299, "Roller Thickness", {1000, 1003}},
 };
 

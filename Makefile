@@ -21,13 +21,16 @@ test: all
 # Builds the engine and runs the examples of examples/shoal (waves over a
 # shoal in a flume, with a map of the significant wave height),
 # examples/beach (waves from a line breaking on a beach, in two runs, the
-# second hot-started from the first) and examples/harbour (the disturbance
-# map and report of a harbour behind a breakwater), with pictures of what
+# second hot-started from the first), examples/harbour (the disturbance
+# map and report of a harbour behind a breakwater) and examples/profile
+# (a 1DH flume: waves breaking and running up a beach, with surface
+# profiles, gauges, wave heights, set-up and runup), with pictures of what
 # they wrote.
 demo: all
 	examples/shoal/run.sh $(CURDIR)/$(BUILD)
 	examples/beach/run.sh $(CURDIR)/$(BUILD)
 	examples/harbour/run.sh $(CURDIR)/$(BUILD)
+	examples/profile/run.sh $(CURDIR)/$(BUILD)
 
 # The speed of the 2DH time loop: a table of points per second by grid size,
 # sweep family and thread count, beside the bandwidth of a plain copy.

@@ -54,6 +54,15 @@ std::vector<double> ReadSectionMap(const Mesh& mesh) {
     return ReadNodeMapBW(k.file, k.item, mesh);
 }
 
+// "text: file: value at point j", j the grid index of the profile (without
+// the file for a constant).
+std::string OutOfRange(const std::string& text, const std::string& file, double value,
+                       int32_t node) {
+    char tail[64];
+    std::snprintf(tail, sizeof tail, "%g at point %d", value, node - 1);
+    return text + ": " + (file.empty() ? "" : file + ": ") + tail;
+}
+
 void SpecDepthBW(BwModel& model) {
     const Mesh& mesh = MeshOf(model.ElevationMesh);
     KvtOpenSection("DEPTH");
@@ -159,6 +168,11 @@ void SetupSponge(BwModel& model) {
         const Mesh& geometry = MeshOf(model.GeometryMesh);
         std::vector<double> s = ReadNodeMapBW(map.file, map.item, geometry);
         for (double& v : s) v = std::fabs(v);
+        // Below 1 the sponge would amplify the waves it should take out.
+        for (int32_t i = 1; i <= geometry.NodeCount; ++i)
+            if (s[i] < 1.0 || s[i] > 100.0)
+                StopRun(OutOfRange("SetupSponge: sponge coefficient outside interval 1<=s<=100",
+                                   map.file, s[i], i));
         model.spongeVelocity = SpreadByElementsBW(s, geometry, MeshOf(model.VelocityMesh));
         model.spongeElevation = SpreadByElementsBW(s, geometry, MeshOf(model.ElevationMesh));
         for (std::vector<double>* f : {&model.spongeVelocity, &model.spongeElevation})
@@ -204,7 +218,23 @@ void SetupFilter(BwModel& model) {
     KvtGetInteger("type", model.filterType);
     if (model.filterType > 0) {
         const Mesh& geometry = MeshOf(model.GeometryMesh);
-        const std::vector<double> c = ReadSectionMap(geometry);
+        std::vector<double> c;
+        std::string file;
+        if (model.filterType == 1) {
+            // One coefficient for the whole profile.
+            double constant = 0.0;
+            KvtGetDouble("filter_coeff", constant);
+            c.assign(static_cast<size_t>(geometry.NodeCount) + 1, constant);
+        } else {
+            const MapKeys map = ReadMapKeys();
+            file = map.file;
+            c = ReadNodeMapBW(map.file, map.item, geometry);
+        }
+        // Outside 0..1 the filter would sharpen the surface instead.
+        for (int32_t i = 1; i <= geometry.NodeCount; ++i)
+            if (c[i] < 0.0 || c[i] > 1.0)
+                StopRun(OutOfRange("SetupFilter: filter coefficient outside interval 0<=f<=1", file,
+                                   c[i], i));
         model.filterVelocity = SpreadByElementsBW(c, geometry, MeshOf(model.VelocityMesh));
         model.filterElevation = SpreadByElementsBW(c, geometry, MeshOf(model.ElevationMesh));
     }

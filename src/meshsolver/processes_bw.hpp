@@ -12,10 +12,6 @@
 
 #include "meshsolver/bw_model.hpp"
 
-// The stop of a 1DH model that asks for what the mesh solver can't do yet.
-inline constexpr const char* kMeshSolverNotAvailable =
-    "The 1DH mesh solver is not yet available in this version";
-
 // DEPTH, SLOT, BED_RESISTANCE, EDDY_VISCOSITY, POROSITY_LAYER, SPONGE_LAYER,
 // WAVE_BREAKING, EXPLICIT_FILTERING of the open BOUSSINESQ_WAVE_MODULE section.
 void SetupProcessesBW(BwModel& model);

@@ -179,8 +179,11 @@ void WriteProcesses(KvtHandle f) {
     End(f);
 
     const FilterSettings& x = gFilter;
+    // A constant coefficient (type 1) goes with its value; the mesh
+    // solver spreads it over the profile.
     Section(f, "EXPLICIT_FILTERING");
     Int(f, "type", x.type);
+    if (x.type == 1) Real(f, "filter_coeff", x.filterCoeff);
     Text(f, "file_name", x.fileName);
     Int(f, "item_number", x.itemNumbers[0]);
     End(f);

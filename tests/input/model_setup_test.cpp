@@ -123,8 +123,10 @@ TEST_F(ModelFile, WhatIsMissingOutOfRangeOrNotAvailableStopsWithItsMessage) {
          "ReadModelSetup: NUMBER_OF_DIMENSIONS must be 1 or 2, not 3"},
         {{{"Internal_Generation", generation}, {"Equation_Parameters", deep + "0.0667\n"}},
          "SetupInternalGeneration: the deep water terms need two items in the series"},
-        {bwtest::ProfileSections({{"WAVE_BREAKING", "type = 1\n"}}),
-         "The 1DH mesh solver is not yet available in this version",
+        // The profile's bed levels given as the filter's map.
+        {bwtest::ProfileSections(
+             {{"EXPLICIT_FILTERING", "type = 2\n" + bwtest::DataFileSection("line.xol1")}}),
+         "SetupFilter: filter coefficient outside interval 0<=f<=1: {dir}/line.xol1: -2 at point 1",
          {},
          "line.xol1"},
     };

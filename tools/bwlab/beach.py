@@ -16,6 +16,18 @@ roller thickness along the middle row are written every step of the last
 periods; wave height is the mean crest-to-trough height of those periods,
 the mean level their time mean.
 
+With --dims 1 the same flume is a profile of the 1DH model: the waves come
+from a generation node FLAT metres before the toe (a series of the flux that
+makes the measured height, from `bwdata waves --drive source`), with a
+sponge of one and a half wavelengths behind it, and the surface and rollers
+along the whole profile are written by a line output of the profile. The
+sponge behind the source relaxes the level there towards the still water
+level, and the wave's return flow and radiation stress in front of it then
+lower the mean level of the whole flume by a few millimetres; the mean
+level of a 1DH run is therefore given relative to its value at the toe
+(the measured mean level there is 0.07 mm or less), and the offset is kept
+in result.json.
+
     beach.py run 031041 [--dx 0.025] [--steps-per-period 128] [--periods 30] [--shore wall]
                         [--set WAVE_BREAKING.roller_factor=3 ...] [--out DIR]
     beach.py compare DIR ...   (the table of several finished runs)
@@ -240,6 +252,189 @@ def build(a):
     return nx, dt, steps
 
 
+def wave_number(period, depth, B):
+    omega = 2.0 * math.pi / period
+    k = omega / math.sqrt(GRAVITY * depth)
+    for _ in range(100):
+        kd = k * depth
+        k = omega / math.sqrt(GRAVITY * depth * (1 + B * kd * kd) / (1 + (B + 1 / 3) * kd * kd))
+    return k
+
+
+def write_profile(path, x, values):
+    with open(path, "w") as f:
+        f.write("x,z\n")
+        for p, v in zip(x, values):
+            f.write(f"{p:.6f},{v:.6f}\n")
+
+
+def model_text_1d(a, nx, steps, dt, record_from, source):
+    """The model file of the profile; a holds the options of the run."""
+    deep = a.deep
+    sections = {
+        "WAVE_BREAKING": {"type": "1"},
+        "Equation_Parameters": {"Deep_Water_Terms": "true" if deep else "false",
+                                "Dispersion_Factor": "0.0666667" if deep else "0"},
+        "MOVING_SHORELINE": {"type": "1", "depth": "-0.45", "width": "0.01",
+                             "smoothing_parameter": "100", "friction_coefficient": "0.1"}
+        if a.shore == "slot" else {"type": "0"},
+    }
+    for s in a.set or []:
+        key, value = s.split("=", 1)
+        section, name = key.split(".", 1)
+        sections.setdefault(section, {})[name] = value
+
+    def body(name):
+        return "\n".join(f"        {k} = {v}" for k, v in sections.get(name, {}).items())
+
+    return f"""# Hansen and Svendsen (1979), test {a.test}: regular waves of {a.period} s
+# breaking on a 1:34.3 slope, as a profile; written by tools/bwlab/beach.py.
+TARNEL_BOUSSINESQ_WAVE {{
+    BASIC_MODEL_PARAMETERS {{
+        NUMBER_OF_DIMENSIONS = 1
+        DELETE_FEM_KVT_FILE = 0
+    }}
+    Bathymetry_Selection {{
+        Hot_Start = false
+        DATA_FILE {{
+            File_name = file("bathymetry.xol1")
+            Item_Count = 1
+            Item_Numbers = 1
+        }}
+    }}
+    Area_Description {{
+        True_land_value = 0.5
+        Reference_Level_Shift = 0
+    }}
+    Simulation_Period {{
+        Time_step_count = {steps}
+        Time_step_interval = {dt:.10f}
+        Warm_up_period = 0
+        Start_time = 2026, 1, 1, 12, 0, 0
+    }}
+    Equation_Parameters {{
+{body("Equation_Parameters")}
+    }}
+    SOLUTION_PARAMETERS {{ Convective_terms_handle = 0 }}
+    MOVING_SHORELINE {{
+{body("MOVING_SHORELINE")}
+    }}
+    Bottom_Friction {{ Resistance_Type = 0 }}
+    WAVE_BREAKING {{
+{body("WAVE_BREAKING")}
+    }}
+    EXPLICIT_FILTERING {{
+        type = 2
+        DATA_FILE {{
+            File_name = file("filter.xol1")
+            Item_Count = 1
+            Item_Numbers = 1
+        }}
+    }}
+    EDDY_VISCOSITY {{ Type = 0 }}
+    Porosity {{ Porosity_Type = false }}
+    Sponge {{
+        Sponge_Type = true
+        DATA_FILE {{
+            File_name = file("sponge.xol1")
+            Item_Count = 1
+            Item_Numbers = 1
+        }}
+    }}
+    Boundary_Location {{ Number_Of_Boundaries = 0 }}
+    Internal_Generation {{
+        Number_Of_Records = 1
+        INTERNAL_GEN_DATA_1 {{
+            First_Line_Pos = {source}, 0
+            Last_Line_Pos = {source}, 0
+            Wave_Type = 0
+            DATA_FILE {{
+                File_name = file("waves.xol0")
+                Item_Count = 2
+                Item_Numbers = 1, 2
+            }}
+        }}
+    }}
+    OUTPUT_DETERMINISTIC_1D {{
+        Number_Of_Records = 1
+        OUTPUT_SPEC_DATA_1 {{
+            File_Name = file("axis.xol1")
+            type = 1
+            X_Range_And_Interval = 0, {nx - 1}
+            No_of_points = {nx}
+            First_Time_step = {record_from}
+            Last_Time_step = {steps}
+            Time_Step_Interval = 1
+            Number_Of_Items = 2
+            Item_Numbers = 3, 6
+            Title = "Surface and rollers along the profile"
+        }}
+    }}
+    OUTPUT_STATISTIC_1D {{ Number_Of_Records = 0 }}
+    OUTPUT_MOVING_SHORELINE_1D {{ INCLUDE_CALCULATION = false }}
+    OPTION_PARAMETERS {{
+        HUD_update_2DH = 50
+    }}
+}}
+"""
+
+
+def build1d(a):
+    """The inputs of a 1DH run; gives the point count, step and steps, and the
+    x of the profile's first point from the toe."""
+    os.makedirs(a.out, exist_ok=True)
+    dx = a.dx
+    B = 1.0 / 15.0 if a.deep else 0.0
+    L = 2.0 * math.pi / wave_number(a.period, DEPTH, B)
+    back = 1.5 * L  # sponge behind the source
+    source = int(round((back + 0.3) / dx))
+    start = -(source * dx + a.flat)  # x of the first point from the toe
+    top = a.beach_top if a.shore == "slot" else -a.end_depth
+    nx = int(round((-start + (DEPTH + top) / SLOPE) / dx)) + 1
+    x = [start + j * dx for j in range(nx)]
+    bed = [-DEPTH if p <= 0 else -DEPTH + p * SLOPE for p in x]
+    end = x[-1]
+    sponge = []
+    for p in x:
+        s = 1.0
+        into_back = (back - (p - start)) / back
+        if into_back > 0:
+            s = 1.0 + 0.5 * into_back ** 2
+        if a.shore == "wall":
+            into_end = (p - (end - a.sponge)) / a.sponge
+            if into_end > 0:
+                s = 1.0 + 0.5 * into_end ** 2
+        sponge.append(s)
+    write_profile(os.path.join(a.out, "bathymetry.csv"), [p - start for p in x], bed)
+    write_profile(os.path.join(a.out, "sponge.csv"), [p - start for p in x], sponge)
+    # The explicit filter from --filter-from metres past the toe on: the
+    # rollers need it where they stand (without it the surf zone grows a
+    # zigzag at the grid scale and the run stops, see docs/validation.md),
+    # and it would take height from the shoaling waves elsewhere.
+    write_profile(os.path.join(a.out, "filter.csv"), [p - start for p in x],
+                  [a.filter if p >= a.filter_from else 0.0 for p in x])
+    dt = a.period / a.steps_per_period
+    steps = a.periods * a.steps_per_period
+    record_from = steps - a.record_periods * a.steps_per_period
+    with open(os.path.join(a.out, "beach.bw"), "w") as f:
+        f.write(model_text_1d(a, nx, steps, dt, record_from, source))
+    bwdata = os.path.join(a.bin, "tools", "bwdata", "bwdata")
+    waves = [bwdata, "waves", "-o", "waves.xol0", "--drive", "source", "--depth", f"{DEPTH}",
+             "--dt", f"{dt:.10f}", "--duration", f"{(steps + 8) * dt:.6f}",
+             "--start", "2026-01-01 12:00:00", "--height", f"{a.height}",
+             "--period", f"{a.period}", "--ramp", f"{3 * a.period}"]
+    if a.deep:
+        waves += ["--deep", f"{B}"]
+    for cmd in ([bwdata, "import-profile", "bathymetry.csv", "-o", "bathymetry.xol1",
+                 "--title", "Plane beach 1:34.3"],
+                [bwdata, "import-profile", "sponge.csv", "-o", "sponge.xol1",
+                 "--title", "Sponge layers"],
+                [bwdata, "import-profile", "filter.csv", "-o", "filter.xol1",
+                 "--title", "Filter coefficients"], waves):
+        subprocess.run(cmd, cwd=a.out, check=True, stdout=subprocess.DEVNULL)
+    return nx, dt, steps, start
+
+
 def analyse(a, nx):
     import netCDF4
     ds = netCDF4.Dataset(os.path.join(a.out, "axis.xol1"))
@@ -255,7 +450,7 @@ def analyse(a, nx):
     # The height of each period, crest to trough, averaged over the periods.
     heights = np.ma.stack([xi[p * n:(p + 1) * n].max(axis=0) - xi[p * n:(p + 1) * n].min(axis=0)
                            for p in range(periods)])
-    x = np.arange(nx) * a.dx - a.flat
+    x = np.arange(nx) * a.dx + a.start
     height = heights.mean(axis=0)
     mean = xi.mean(axis=0)
     return x, height, mean, np.ma.filled(delta[-periods * n:].max(axis=0), 0.0)
@@ -309,10 +504,19 @@ def run(a):
     if a.out is None:
         a.out = os.path.join(os.getcwd(), f"run-{a.test}")
     if a.reanalyse:  # the files of an earlier run
-        nx = int(open(os.path.join(a.out, "beach.bw")).read().split("X_Range_And_Interval = 0, ")[1]
-                 .split(",")[0]) + 1
+        text = open(os.path.join(a.out, "beach.bw")).read()
+        nx = int(text.split("X_Range_And_Interval = 0, ")[1].split(",")[0].split()[0]) + 1
+        a.start = -a.flat
+        if a.dims == 1:
+            with open(os.path.join(a.out, "result.json")) as f:
+                a.start = json.load(f)["profile_start"]
         r = subprocess.CompletedProcess([], 0)
+    elif a.dims == 1:
+        nx, dt, steps, a.start = build1d(a)
+        bw = os.path.join(a.bin, "src", "bw")
+        r = subprocess.run([bw, "beach.bw"], cwd=a.out, capture_output=True, text=True)
     else:
+        a.start = -a.flat
         nx, dt, steps = build(a)
         bw = os.path.join(a.bin, "src", "bw")
         env = dict(os.environ, OMP_NUM_THREADS=str(a.threads))
@@ -327,6 +531,10 @@ def run(a):
             json.dump(result, f, indent=1)
         return 1
     x, height, mean, dmax = analyse(a, nx)
+    offset = 0.0
+    if a.dims == 1:  # the mean level from its value at the toe, see above
+        offset = float(np.interp(0.0, x, np.ma.filled(mean, np.nan)))
+        mean = mean - offset
     # Where breaking starts: the first point on the slope whose roller grows
     # thicker than 1 mm in the periods kept.
     onset = x[(x > 0.0) & (dmax > 1e-3)]
@@ -336,6 +544,9 @@ def run(a):
             f.write(f"{p:.4f},{h:.6f},{m:.6f}\n")
     result = compare(a, x, height, mean)
     result["roller_thickness_max"] = float(dmax.max())
+    result["dims"] = a.dims
+    result["profile_start"] = a.start
+    result["mean_level_offset"] = offset
     if onset.size:
         result["onset_x_model"] = float(onset[0])
         result["onset_error"] = (float(onset[0]) - result["break_x_measured"]) / result["break_x_measured"]
@@ -404,6 +615,8 @@ def main(argv=None):
     sub = p.add_subparsers(dest="command", required=True)
     r = sub.add_parser("run")
     r.add_argument("test", choices=sorted(TESTS))
+    r.add_argument("--dims", type=int, choices=[1, 2], default=2,
+                   help="1: the profile model; 2: a channel of the grid model")
     r.add_argument("--dx", type=float, default=0.025)
     r.add_argument("--steps-per-period", type=int, default=128)
     r.add_argument("--periods", type=int, default=30)
@@ -418,7 +631,10 @@ def main(argv=None):
     r.add_argument("--height", type=float, help="wave height at the boundary (default: measured at the toe)")
     r.add_argument("--deep", action="store_true", help="the deep-water terms, B = 1/15")
     r.add_argument("--extrapolation", type=float, default=1.0)
-    r.add_argument("--filter", type=float, default=0.1, help="Grid_scale_filter")
+    r.add_argument("--filter", type=float, default=0.1,
+                   help="Grid_scale_filter; with --dims 1 the explicit filter's coefficient")
+    r.add_argument("--filter-from", type=float, default=-100.0,
+                   help="--dims 1: the filter acts from this x (m from the toe) on")
     r.add_argument("--set", action="append", help="SECTION.key=value in the model file")
     r.add_argument("--threads", type=int, default=1)
     r.add_argument("--bin", default=os.path.join(ROOT, "build", "release"))

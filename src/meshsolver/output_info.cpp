@@ -64,6 +64,9 @@ OutputRecord1D ReadOutputInfo1DH(KvtHandle parent, int32_t list, int32_t number)
     const KvtHandle section = KvtOpenSection(parent, Filled("OUTPUT_SPEC_DATA_%", number));
     OutputRecord1D r;
     r.list = list;
+    // Without a time range of its own a record covers the whole run, each
+    // step: what a file of a profile's run is wanted for.
+    r.firstStep = 0, r.lastStep = gGrid.timeStepCount, r.stepInterval = 1;
     if (list == kOutputListStatistic) {
         const WaveStatistic1D& s = gOutput1D.statistics;
         r.firstStep = s.firstStep, r.lastStep = s.lastStep, r.stepInterval = s.stepInterval;
@@ -121,6 +124,7 @@ void SetupOutputInfo1D(KvtHandle target) {
     KvtGetInteger(statistic, "Number_Of_Records", count);
     KvtGetInteger(statistic, "Type", s.type);
     KvtGetInteger(statistic, "Type_of_mean_calculation", s.meanCalculation);
+    s.firstStep = 0, s.lastStep = gGrid.timeStepCount;
     KvtGetInteger(statistic, "First_Time_Step", s.firstStep);
     KvtGetInteger(statistic, "Last_Time_Step", s.lastStep);
     KvtGetInteger(statistic, "Time_Step_Interval", s.stepInterval);

@@ -22,7 +22,7 @@ struct OutputRecord1D {
     int32_t points = 1;                       // points of a line, or of a point series
     int32_t kind = 0;                         // 0 a series of points, 1 or 2 a line
     std::vector<int32_t> pointIndices;        // the grid indices of a point series
-    int32_t firstStep = 0, lastStep = 0, stepInterval = 1;
+    int32_t firstStep = 0, lastStep = 0, stepInterval = 1;  // default: every step of the run
     int32_t numberOfItems = 1;
     std::vector<int32_t> itemNumbers;  // default 1, 2, ..., numberOfItems
     std::string fileName;              // full path
@@ -33,7 +33,7 @@ struct OutputRecord1D {
 struct WaveStatistic1D {
     int32_t type = 1;
     int32_t meanCalculation = 1;
-    int32_t firstStep = 0, lastStep = 0, stepInterval = 1;
+    int32_t firstStep = 0, lastStep = 0, stepInterval = 1;  // default: every step of the run
     int32_t firstWave = 0;
     float epsHigh = 1.0e-4f, epsLow = -1.0e-4f;
 };

@@ -1,18 +1,15 @@
 // The banded solver against a dense elimination of the same matrix: random
-// non-symmetric, diagonally dominant systems of the bands the mesh solver
-// uses, the full band of a single quadratic element, identity rows, factors
-// reused for a second right-hand side, and the stops of a bad allocation.
+// non-symmetric systems of the bands the mesh solver uses, with and without
+// diagonal dominance, the full band of a single quadratic element, identity
+// rows, factors reused for a second right-hand side, and a zero pivot.
 #include "equations/band_matrix.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <cstdlib>
 #include <random>
 #include <string>
 #include <vector>
-
-#include "equations/linear_systems_bw.hpp"
 
 namespace {
 
@@ -87,17 +84,24 @@ void ExpectNear(const std::vector<double>& a, const std::vector<double>& b, doub
 TEST(BandSolver, MatchesDenseEliminationAndReusesItsFactors) {
     std::mt19937 rng(20260);
     // The bands of the flux and the elevation system, a single quadratic
-    // element (order 3, the band full), and a band without dominance, where
-    // the solve must pivot.
+    // element (order 3, the band full), bands without dominance, where the
+    // solve must pivot, and boundary rows set to identity, which return
+    // their right-hand side unchanged.
     struct Case {
         int32_t n, kl, ku;
         bool dominant;
+        std::vector<int32_t> identityRows;
     };
-    for (const Case c : {Case{41, 2, 2, true}, Case{20, 1, 1, true}, Case{3, 2, 2, true},
-                         Case{30, 2, 2, false}, Case{12, 1, 3, false}}) {
+    for (const Case& c :
+         {Case{41, 2, 2, true, {}}, Case{20, 1, 1, true, {}}, Case{3, 2, 2, true, {}},
+          Case{30, 2, 2, false, {}}, Case{12, 1, 3, false, {}}, Case{9, 2, 2, true, {1, 5, 9}}}) {
         SCOPED_TRACE("n " + std::to_string(c.n) + " kl " + std::to_string(c.kl) + " ku " +
                      std::to_string(c.ku));
         Pair p = RandomSystem(c.n, c.kl, c.ku, rng, c.dominant);
+        for (int32_t i : c.identityRows) {
+            SetIdentityRow(p.system.Matrix, i);
+            for (int32_t j = 1; j <= c.n; ++j) p.dense[i - 1][j - 1] = i == j ? 1.0 : 0.0;
+        }
         const std::vector<double> before = p.system.Matrix.Values;
         const std::vector<double> b1 = RandomVector(c.n, rng), b2 = RandomVector(c.n, rng);
         std::vector<double> x(c.n, 0.0);
@@ -105,6 +109,7 @@ TEST(BandSolver, MatchesDenseEliminationAndReusesItsFactors) {
         SolveBGE(p.system, b1.data(), x.data(), 1, info);
         EXPECT_EQ(info, 0);
         ExpectNear(x, DenseSolve(p.dense, b1), 1.0e-9);
+        for (int32_t i : c.identityRows) EXPECT_DOUBLE_EQ(x[i - 1], b1[i - 1]);
         // The factors stand in place of the values, and serve the next right-hand side.
         EXPECT_NE(p.system.Matrix.Values, before);
         const std::vector<double> factors = p.system.Matrix.Values;
@@ -112,27 +117,10 @@ TEST(BandSolver, MatchesDenseEliminationAndReusesItsFactors) {
         EXPECT_EQ(info, 0);
         ExpectNear(x, DenseSolve(p.dense, b2), 1.0e-9);
         EXPECT_EQ(p.system.Matrix.Values, factors);
+        // Clearing empties the fill-in room too, for the next assembly.
+        ClearBandMatrix(p.system.Matrix);
+        for (double v : p.system.Matrix.Values) ASSERT_EQ(v, 0.0);
     }
-}
-
-// A boundary row set to identity returns its right-hand side unchanged.
-TEST(BandSolver, IdentityRowsReturnThePrescribedValue) {
-    std::mt19937 rng(7);
-    Pair p = RandomSystem(9, 2, 2, rng, true);
-    for (int32_t i : {1, 5, 9}) {
-        SetIdentityRow(p.system.Matrix, i);
-        for (int32_t j = 1; j <= 9; ++j) p.dense[i - 1][j - 1] = i == j ? 1.0 : 0.0;
-    }
-    const std::vector<double> b = RandomVector(9, rng);
-    std::vector<double> x(9);
-    int32_t info = 0;
-    SolveBGE(p.system, b.data(), x.data(), 1, info);
-    ExpectNear(x, DenseSolve(p.dense, b), 1.0e-10);
-    for (int32_t i : {1, 5, 9}) EXPECT_DOUBLE_EQ(x[i - 1], b[i - 1]);
-
-    // Clearing empties the fill-in room too, for the next assembly.
-    ClearBandMatrix(p.system.Matrix);
-    for (double v : p.system.Matrix.Values) ASSERT_EQ(v, 0.0);
 }
 
 // A zero pivot is handed back through info, not stopped on.
@@ -147,53 +135,6 @@ TEST(BandSolver, SingularMatrixReportsItsPivot) {
     int32_t info = 0;
     SolveBGE(s, b, x, 1, info);
     EXPECT_EQ(info, 2);
-}
-
-TEST(BandSolver, SystemsOfTheBoussinesqModule) {
-    // A line of 4 nodes: 7 nodes of the quadratic mesh.
-    LinearSystemsBW les;
-    SetupLesBW(les, 7, 4, 4);
-    const BandMatrix& a = les.FluxMatrix.Matrix;
-    const BandMatrix& b = les.ElevationMatrix.Matrix;
-    const BandMatrix& c = les.AuxMatrix.Matrix;
-    EXPECT_EQ(std::vector<int32_t>({a.Order, a.LowerDiagonals, a.UpperDiagonals, a.LeadingDimension,
-                                    b.Order, b.LowerDiagonals, b.UpperDiagonals, b.LeadingDimension,
-                                    c.Order}),
-              std::vector<int32_t>({7, 2, 2, 7, 4, 1, 1, 4, 4}));
-    EXPECT_EQ(a.Values.size(), 49u);
-    EXPECT_EQ(les.FluxMatrix.Pivots.size(), 7u);
-    EXPECT_EQ(les.AuxMatrix.Pivots.size(), 4u);
-    EXPECT_EQ(les.StateSize, 11);
-    EXPECT_EQ(les.work1.size(), 12u);
-    EXPECT_EQ(les.work2.size(), 12u);
-}
-
-TEST(BandSolverDeathTest, AllocationChecksInOrder) {
-    setenv("TRF", "HUD", 1);  // stop texts go to standard error
-    struct Case {
-        int32_t order, kl, ku, ld;
-        const char* message;
-    };
-    for (const Case c : {Case{0, 0, 0, 0, "Order of matrix must be positive"},
-                         Case{3, 0, 0, 0, "Number of diagonals must be positive"},
-                         Case{3, 1, 0, 0, "Number of diagonals must be positive"},
-                         Case{3, 1, 1, 0, "Leading dimension must be positive"},
-                         Case{3, 1, 1, -4, "Leading dimension must be positive"}}) {
-        BandMatrix m;
-        EXPECT_EXIT(AllocateBandMatrix(m, c.order, c.kl, c.ku, c.ld), testing::ExitedWithCode(1),
-                    std::string("AllocateBandMatrix: ") + c.message);
-    }
-    BandMatrix m;
-    AllocateBandMatrix(m, 4, 1, 2, 9);  // a leading dimension beyond the least is kept
-    EXPECT_EQ(m.LeadingDimension, 9);
-    EXPECT_EXIT(AllocateBandMatrix(m, 4, 1, 1), testing::ExitedWithCode(1),
-                "AllocateBandMatrix: Matrix already allocated");
-#ifndef __SANITIZE_ADDRESS__  // the sanitizer's allocator ends the process on such a request
-    BandMatrix huge;
-    EXPECT_EXIT(AllocateBandMatrix(huge, 2000000000, 1000000, 1000000), testing::ExitedWithCode(1),
-                "AllocateBandMatrix: Can't allocate memory");
-#endif
-    unsetenv("TRF");
 }
 
 }  // namespace

@@ -2,7 +2,7 @@
 // of one item (equidistant) and of two (x given), the quadratic mesh made
 // from a line, element lengths and code sections, the DOMAIN section with
 // its code lists, datum and refinement, the block "Mesh information", and
-// the stops on files and settings a run can't use.
+// the stops on files a run can't use.
 #include "mesh/mesh.hpp"
 
 #include <gtest/gtest.h>
@@ -32,10 +32,8 @@ void WriteLevels(const std::string& path, const std::vector<std::vector<float>>&
     bwtest::WriteLineFile(path, "2004-01-01 00:00:00", 1.0, spacing, steps);
 }
 
-std::vector<double> Nodes(const std::vector<double>& v) {
-    return {v.begin() + 1, v.end()};
-}
-std::vector<int32_t> Nodes(const std::vector<int32_t>& v) {
+template <typename T>
+std::vector<T> Nodes(const std::vector<T>& v) {
     return {v.begin() + 1, v.end()};
 }
 
@@ -73,25 +71,6 @@ protected:
 };
 using MeshModelDeathTest = MeshModel;
 
-TEST_F(MeshModel, EquidistantLineWithDryEnds) {
-    WriteLevels(dir / "bed.xol1", {kLevels});
-    Mesh m;
-    ReadMesh(dir / "bed.xol1", m);
-    EXPECT_EQ(m.NodeCount, 6);
-    EXPECT_EQ(m.dimension, 1);
-    EXPECT_EQ(m.projection, "NON-UTM");
-    EXPECT_EQ(Nodes(m.x), std::vector<double>({0, 2, 4, 6, 8, 10}));
-    EXPECT_EQ(Nodes(m.y), std::vector<double>(6, 0.0));
-    // The dry ends take the level of their neighbours.
-    EXPECT_EQ(Nodes(m.z), std::vector<double>({-1, -1, -2, -3, -4, -4}));
-    EXPECT_EQ(Nodes(m.code), std::vector<int32_t>({2, 0, 0, 0, 0, 2}));
-    EXPECT_EQ(m.ElementCount, 5);
-    EXPECT_EQ(Nodes(m.ElementType), std::vector<int32_t>(5, kLinearLine));
-    EXPECT_EQ(Nodes(m.ElementActive), std::vector<int32_t>(5, 1));
-    EXPECT_EQ(ElementNodes(m),
-              (std::vector<std::vector<int32_t>>{{1, 2}, {2, 3}, {3, 4}, {4, 5}, {5, 6}}));
-}
-
 // Two items: x comes from the first; the line is not equidistant, so its
 // elements differ in length, and so do those of its refinement.
 TEST_F(MeshModel, LineOfGivenPositionsAndItsRefinement) {
@@ -106,40 +85,17 @@ TEST_F(MeshModel, LineOfGivenPositionsAndItsRefinement) {
 
     RefineMesh(line, fine);
     SetupMeshTopology(fine);
-    EXPECT_EQ(fine.NodeCount, 7);
-    EXPECT_EQ(fine.ElementCount, 3);
-    EXPECT_EQ(fine.dimension, 1);
     EXPECT_EQ(Nodes(fine.x), std::vector<double>({0, 0.5, 1, 2, 3, 4.5, 6}));
     EXPECT_EQ(Nodes(fine.z), std::vector<double>({-1, -1.5, -2, -2.5, -3, -4, -5}));
-    EXPECT_EQ(Nodes(fine.code), std::vector<int32_t>({2, 0, 0, 0, 4, 0, 2}));
-    EXPECT_EQ(Nodes(fine.ElementType), std::vector<int32_t>(3, kQuadraticLine));
     // Left, right, middle.
     EXPECT_EQ(ElementNodes(fine),
               (std::vector<std::vector<int32_t>>{{1, 3, 2}, {3, 5, 4}, {5, 7, 6}}));
-    EXPECT_EQ(Nodes(fine.ElementLength), std::vector<double>({1, 2, 3}));
     // Sections of the nonzero codes, ascending, with their nodes.
     ASSERT_EQ(fine.CodeSections.size(), 2u);
-    EXPECT_EQ(fine.CodeSections[0].code, 2);
-    EXPECT_EQ(fine.CodeSections[0].nodes, std::vector<int32_t>({1, 7}));
-    EXPECT_EQ(fine.CodeSections[1].code, 4);
-    EXPECT_EQ(fine.CodeSections[1].nodes, std::vector<int32_t>({5}));
-    // Both element types share one shape entry each.
-    EXPECT_EQ(gShapes.count, 2);
-    EXPECT_EQ(fine.ElementShape[1], fine.ElementShape[3]);
-    EXPECT_NE(fine.ElementShape[1], line.ElementShape[1]);
-}
-
-// The shortest line: one element, which refines to three nodes.
-TEST_F(MeshModel, LineOfTwoPoints) {
-    WriteLevels(dir / "bed.dt1", {{-3.0f, 2.0f}}, 5.0f);
-    Mesh line, fine;
-    ReadMesh(dir / "bed.dt1", line);
-    EXPECT_EQ(Nodes(line.z), std::vector<double>({-3, -3}));
-    RefineMesh(line, fine);
-    EXPECT_EQ(fine.NodeCount, 3);
-    EXPECT_EQ(Nodes(fine.x), std::vector<double>({0, 2.5, 5}));
-    EXPECT_EQ(Nodes(fine.code), std::vector<int32_t>({2, 0, 2}));
-    EXPECT_EQ(ElementNodes(fine), (std::vector<std::vector<int32_t>>{{1, 3, 2}}));
+    EXPECT_EQ(std::make_pair(fine.CodeSections[0].code, fine.CodeSections[0].nodes),
+              std::make_pair(2, std::vector<int32_t>({1, 7})));
+    EXPECT_EQ(std::make_pair(fine.CodeSections[1].code, fine.CodeSections[1].nodes),
+              std::make_pair(4, std::vector<int32_t>({5})));
 }
 
 TEST_F(MeshModel, DatumAndClipOfBoundaryLevels) {
@@ -164,12 +120,12 @@ TEST_F(MeshModel, DomainSectionMakesBothMeshesAndReportsThem) {
         "value_of_code = 2, 3\ntype_of_mesh = 2\ntype_of_gauss = 3\n");
     bwtest::LogCapture log;
     SetupSpaceDiscretization(1);
-    const MeshTable& t = gMeshes;
-    ASSERT_EQ(t.number_of_meshes, 2);
-    EXPECT_EQ(t.number_of_dimensions, 1);
-    const Mesh& line = t.meshes[1];
-    const Mesh& fine = t.meshes[2];
+    ASSERT_EQ(gMeshes.number_of_meshes, 2);
+    const Mesh& line = gMeshes.meshes[1];
+    const Mesh& fine = gMeshes.meshes[2];
     EXPECT_EQ(std::make_pair(line.id, fine.id), std::make_pair(1, 2));
+    EXPECT_EQ(Nodes(line.x), std::vector<double>({0, 2, 4, 6, 8, 10}));
+    // The datum, and the dry ends at the level of their neighbours.
     EXPECT_EQ(Nodes(line.z), std::vector<double>({-0.5, -0.5, -1.5, -2.5, -3.5, -3.5}));
     EXPECT_EQ(Nodes(line.code), std::vector<int32_t>({2, 0, 2, 0, 0, 3}));
     // The refinement carries the codes as they stand after the lists.
@@ -198,28 +154,7 @@ TEST_F(MeshModel, DomainSectionMakesBothMeshesAndReportsThem) {
     EXPECT_EQ(lines[block.size() + 4], "  Number of nodes            : 11");
 }
 
-// More than one mesh: each in its own section, and no refinement.
-TEST_F(MeshModel, MeshesInNumberedSections) {
-    WriteLevels(dir / "a.xol1", {kLevels});
-    WriteLevels(dir / "b.xol1", {{0.0f, 4.0f, 5.0f}, {-1.0f, -1.0f, -1.0f}});
-    UseDomain(
-        "number_of_meshes = 2\nMesh_1 {\nfile_name = file(\"a.xol1\")\n}\n"
-        "Mesh_2 {\nfile_name = file(\"b.xol1\")\n}\ntype_of_mesh = 2\n");
-    SetupSpaceDiscretization(1);
-    EXPECT_EQ(gMeshes.number_of_meshes, 2);
-    EXPECT_EQ(gMeshes.number_of_dimensions, 2);  // the default
-    EXPECT_EQ(gMeshes.meshes[1].NodeCount, 6);
-    EXPECT_EQ(Nodes(gMeshes.meshes[2].x), std::vector<double>({0, 4, 5}));
-    EXPECT_EQ(gMeshes.meshes[2].id, 2);
-    EXPECT_EQ(gMeshes.meshes[2].ElementType[1], kLinearLine);
-}
-
-TEST_F(MeshModelDeathTest, FilesAndSettingsThatStop) {
-    // Too many meshes stops before any is read: the named file does not exist.
-    UseDomain("number_of_meshes = 5\nfile_name = file(\"none.xol1\")\n");
-    EXPECT_EXIT(SetupSpaceDiscretization(1), testing::ExitedWithCode(1),
-                "SetupSpaceDiscretization: Too many meshes");
-
+TEST_F(MeshModelDeathTest, BathymetryFilesThatStop) {
     bwtest::MapSpec grid;
     grid.J = 3, grid.K = 2;
     bwtest::WriteMapFile(dir / "map.xol1", grid, bwtest::Constant(grid, -1.0f));
@@ -231,8 +166,6 @@ TEST_F(MeshModelDeathTest, FilesAndSettingsThatStop) {
                 "ReadMeshBasicXol1: Wrong number of items in file");
     EXPECT_EXIT(ReadMesh(dir / "bed.mesh", m), testing::ExitedWithCode(1),
                 "ReadMesh: Unknown type of mesh file");
-    EXPECT_EXIT(SetupShapeData(21), testing::ExitedWithCode(1),
-                "SetupShapeData: Unknown element type 21");
 }
 
 }  // namespace

@@ -2,18 +2,32 @@
 // elements (mesh 1: geometry, elevation and auxiliary variable) and its
 // quadratic refinement (mesh 2: flux), walls at both ends as the boundary
 // setup makes them (velocity node type 3 and auxiliary node type 2, both of
-// value 0), and the model record ready for the integrator.
+// value 0), the model record ready for the integrator; the boundary codes
+// read into it from a solver file; the standing wave of one wavelength
+// between its walls; and a 1DH model file run by the engine.
 #pragma once
 
+#include <gtest/gtest.h>
+
+#include <algorithm>
 #include <cmath>
 #include <functional>
+#include <numbers>
+#include <string>
 #include <vector>
 
 #include "equations/time_integrators.hpp"
+#include "input/kvt_access.hpp"
+#include "input/kvt_current.hpp"
 #include "mesh/mesh.hpp"
 #include "mesh/shape.hpp"
+#include "meshsolver/boundary_bw.hpp"
 #include "meshsolver/bw_model.hpp"
 #include "meshsolver/equations_bw.hpp"
+#include "meshsolver/run_mesh_solver.hpp"
+#include "platform/kvt/kvt.hpp"
+#include "support/model_builder.hpp"
+#include "support/test_support.hpp"
 
 namespace bwtest {
 
@@ -62,15 +76,12 @@ inline BwModel& BuildFlume(int32_t elements, double length,
     m.ElevationStart = nu + 1;
     m.StateSize = nu + ne;
     m.Flux.assign(nu + 1, 0.0);
-    m.Elevation.assign(ne + 1, 0.0);
-    m.ElevationRate.assign(ne + 1, 0.0);
-    m.TotalDepth.assign(ne + 1, 0.0);
-    m.StillDepth.assign(ne + 1, 0.0);
+    for (auto* v : {&m.Elevation, &m.ElevationRate, &m.TotalDepth, &m.StillDepth, &m.Resistance,
+                    &m.AuxVariable})
+        v->assign(ne + 1, 0.0);
     for (int32_t i = 1; i <= ne; ++i) m.StillDepth[i] = -line.z[i];
     m.SlotWidth.assign(ne + 1, 1.0);
     m.Porosity.assign(ne + 1, 1.0);
-    m.Resistance.assign(ne + 1, 0.0);
-    m.AuxVariable.assign(ne + 1, 0.0);
 
     m.VelocitySet.recordOfNode.assign(nu + 1, 0);
     AddRecord(m.VelocitySet, 1, kNodeFlux, -1.0);
@@ -86,6 +97,36 @@ inline BwModel& BuildFlume(int32_t elements, double length,
     m.Dae.DaeMethod = 1;
     SetupTG3(m);
     return m;
+}
+
+// Gives node `node` of the line (and its node in the flux mesh) the code
+// and sets up the code sections of both meshes again.
+inline void SetNodeCode(int32_t node, int32_t code) {
+    gMeshes.meshes[1].code[node] = code;
+    gMeshes.meshes[2].code[2 * node - 1] = code;
+    SetupMeshTopology(gMeshes.meshes[1]);
+    SetupMeshTopology(gMeshes.meshes[2]);
+}
+
+// Reads BOUNDARY_CONDITIONS made of the CODE_n sections `codes` into m, for
+// a run of `steps` steps of dt from 2004-01-01, with the solver file at path.
+inline void ReadBoundaryConditions(BwModel& m, const std::string& path, const std::string& codes,
+                                   double dt, int32_t steps) {
+    gMeshRun = MeshRunState{};
+    gMeshRun.StartDate = MakeDateTime(2004, 1, 1, 0, 0, 0);
+    gMeshRun.TimeStepInterval = dt;
+    gMeshRun.LastStep = steps;
+    WriteFile(path, "MeshSolverBW {\nBOUSSINESQ_WAVE_MODULE {\nBOUNDARY_CONDITIONS {\n" + codes +
+                        "}\n}\n}\n");
+    testing::internal::CaptureStdout();
+    KvtHandle file = KvtOpenFile(path, false);
+    KvtUseFile(file);
+    KvtOpenTarget("MeshSolverBW");
+    KvtOpenSection("BOUSSINESQ_WAVE_MODULE");
+    SetupBoundCondBW(m);
+    KvtCloseSection();
+    kvtClose(&file);
+    testing::internal::GetCapturedStdout();
 }
 
 // Starts the flume from rest with the surface eta0(x) and brings depth,
@@ -112,6 +153,61 @@ inline double SurfaceVolume(const BwModel& m) {
 inline double TheoryOmega(double k, double d, double B) {
     const double kd2 = (k * d) * (k * d);
     return std::sqrt(9.81 * d * k * k * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
+}
+
+// A standing wave of one wavelength (wave number kd) between the walls of a
+// flat flume 1 m deep, from rest with the surface amplitude cos(k x): the
+// period from the zero crossings of the surface at the left wall, the
+// largest drift of the volume, and the surface at the end.
+struct StandingWave {
+    double period = 0.0, theory = 0.0, volumeDrift = 0.0, waterVolume = 0.0;
+    int32_t status = 0;
+    std::vector<double> surface;
+};
+
+inline StandingWave RunStandingWave(double kd, int32_t formulation, double beta, int32_t elements,
+                                    int32_t stepsPerPeriod, int32_t periods, double amplitude) {
+    const double k = kd, length = 2.0 * std::numbers::pi / k;
+    StandingWave w;
+    w.theory = 2.0 * std::numbers::pi / TheoryOmega(k, 1.0, beta);
+    w.waterVolume = length;
+    const double dt = w.theory / stepsPerPeriod;
+    BwModel& m = BuildFlume(
+        elements, length, [](double) { return 1.0; }, formulation, beta, dt);
+    StartFlume(m, [&](double x) { return amplitude * std::cos(k * x); });
+    const double v0 = SurfaceVolume(m);
+    double previous = m.Elevation[1], first = -1.0, last = -1.0;
+    int32_t crossings = 0;
+    for (int32_t s = 1; s <= periods * stepsPerPeriod; ++s) {
+        SolveTimeStepBW(s * dt, m, w.status);
+        if (w.status != 0) return w;
+        const double now = m.Elevation[1];
+        if ((previous > 0.0) != (now > 0.0)) {
+            last = (s - 1) * dt + dt * previous / (previous - now);
+            if (crossings++ == 0) first = last;
+        }
+        previous = now;
+        w.volumeDrift = std::max(w.volumeDrift, std::abs(SurfaceVolume(m) - v0));
+    }
+    w.period = crossings > 1 ? 2.0 * (last - first) / (crossings - 1) : 0.0;
+    w.surface = m.Elevation;
+    return w;
+}
+
+// Writes dir/m.bw, a 1DH model over the line `bathymetry` with the sections
+// `given`, and runs the engine on it there: -check if asked, the progress
+// channel (and with it the kill file) only if asked.
+inline RunResult RunProfileModel(const TempDir& dir,
+                                 const std::map<std::string, std::string>& given, bool check,
+                                 const std::string& bathymetry = "line.xol1",
+                                 bool progress = false) {
+    WriteFile(dir / "m.bw", ModelText(bathymetry, ProfileSections(given)));
+    std::vector<std::string> argv = {BuiltProgram("bw")};
+    if (check) argv.push_back("-check");
+    argv.push_back("m.bw");
+    std::map<std::string, std::string> env = {{"OMP_NUM_THREADS", "1"}};
+    if (!progress) env["TARN_PROGRESS"] = "NONE";
+    return RunProgram(argv, dir.path.string(), env, {"BUILDMODE", "TRF", "TARN_PROGRESS"});
 }
 
 }  // namespace bwtest

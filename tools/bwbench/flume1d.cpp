@@ -11,7 +11,9 @@
 // solves and the rest, each routine timed again on the state the run left;
 // then the band solves written out here, as a share of the library's time
 // and whether they give the same bits, and the share of the clock reads
-// (part of the rest).
+// (part of the rest). A third flume has the processes of a beach on: the
+// rollers, the slot and the wave statistics that the driver feeds after
+// each step (without files).
 #include "flume1d.hpp"
 
 #include <omp.h>
@@ -24,12 +26,16 @@
 
 #include "equations/band_matrix.hpp"
 #include "equations/time_integrators.hpp"
+#include "input/kvt_current.hpp"
 #include "mesh/mesh.hpp"
 #include "mesh/shape.hpp"
 #include "meshsolver/boundary_bw.hpp"
 #include "meshsolver/bw_model.hpp"
 #include "meshsolver/equations_bw.hpp"
+#include "meshsolver/output_bw.hpp"
 #include "meshsolver/run_mesh_solver.hpp"
+#include "meshsolver/statistics_bw.hpp"
+#include "platform/kvt/kvt.hpp"
 #include "run/timing.hpp"
 
 namespace {
@@ -145,6 +151,40 @@ BwModel& BuildFlume(int32_t nodes, bool sloping) {
     return m;
 }
 
+// Rollers with their defaults, the slot 0.1 m under the deepest bed with a
+// friction of 0.1, and the wave statistics of every node from the start,
+// set up through a solver file of one section as a run reads it.
+void SwitchOnProcesses(BwModel& m, int32_t steps) {
+    BreakingStateBW& b = m.Breaking;
+    b.type = 1;
+    b.tanInitial = std::tan(20.0 * M_PI / 180.0);
+    b.tanFinal = std::tan(10.0 * M_PI / 180.0);
+    const size_t n = static_cast<size_t>(gMeshes.meshes[1].NodeCount) + 1;
+    for (std::vector<double>* v : {&b.delta, &b.deltaOld, &b.celerity, &b.slope}) v->assign(n, 0.0);
+    b.tanPhi.assign(n, b.tanInitial);
+    b.tanPhiOld.assign(n, b.tanInitial);
+    m.Slot.type = 1;
+    m.Slot.depth = -(kDepth + 0.1);
+    m.Slot.width = 0.01;
+    m.Slot.smoothing = 100.0;
+    m.Slot.friction = 0.1;
+    for (std::vector<double>* v :
+         {&m.BedLevel, &m.NodalFlux, &m.NodalFluxQ, &m.ElevationBelowRoller})
+        v->assign(n, 0.0);
+    const char* path = "bwbench_statistics.kvt";
+    if (FILE* f = std::fopen(path, "w")) {
+        std::fputs("MeshSolverBW {\nWAVE_STATISTIC {\nType_of_wave_statistic = 1\n}\n}\n", f);
+        std::fclose(f);
+    }
+    KvtHandle file = KvtOpenFile(path, false);
+    KvtUseFile(file);
+    KvtOpenTarget("MeshSolverBW");
+    gMeshRun.LastStep = steps;
+    SetupWaveStatisticBW(m);
+    kvtClose(&file);
+    std::remove(path);
+}
+
 // The solve of a system factored by dgbtrf written out for one right-hand
 // side: the steps of dgbtrs ('N', NRHS = 1) with its row swaps and the
 // updates of its dger and dtbsv in their order, so that each value comes
@@ -234,15 +274,19 @@ struct FlumeCost {
 
 // The best of `repeats` runs of `steps` steps (the machine is shared), and
 // the parts timed again on the state of the last run.
-FlumeCost MeasureFlume(int32_t nodes, bool sloping, int32_t steps, int repeats) {
+FlumeCost MeasureFlume(int32_t nodes, bool sloping, int32_t steps, int repeats, bool processes) {
     FlumeCost c;
     c.step = c.wallStep = 1e30;
+    std::vector<OutputFile> noFiles;
     for (int r = 0; r < repeats; ++r) {
         BwModel& m = BuildFlume(nodes, sloping);
+        if (processes) SwitchOnProcesses(m, steps);
         int32_t status = 0;
         const double cpu0 = CpuSeconds(), wall0 = WallSeconds();
-        for (int32_t s = 1; s <= steps && status == 0; ++s)
+        for (int32_t s = 1; s <= steps && status == 0; ++s) {
             SolveTimeStepBW(s * kTimeStep, m, status);
+            if (processes) WriteOutputHD3D(s, 0, noFiles, m);
+        }
         c.step = std::min(c.step, (CpuSeconds() - cpu0) / steps);
         c.wallStep = std::min(c.wallStep, (WallSeconds() - wall0) / steps);
         c.blewUp = status != 0;
@@ -308,19 +352,23 @@ void FlumeTable(double scale, int32_t onlyNodes) {
                 "rest", "max |eta|", "own solves", "timers");
     const std::vector<int32_t> sizes =
         onlyNodes > 0 ? std::vector<int32_t>{onlyNodes} : std::vector<int32_t>{2000, 20000};
+    struct Case {
+        bool sloping, processes;
+    };
     for (int32_t nodes : sizes)
-        for (bool sloping : {false, true}) {
+        for (const Case k : {Case{false, false}, Case{true, false}, Case{true, true}}) {
+            const bool sloping = k.sloping;
             const int32_t steps = std::max(50, static_cast<int32_t>(scale * 2e7 / nodes));
-            const FlumeCost c = MeasureFlume(nodes, sloping, steps, 3);
+            const FlumeCost c = MeasureFlume(nodes, sloping, steps, 3, k.processes);
             const double e = c.elements / c.step, s = c.solves / c.step;
             // The written-out solves: their time as a share of the library's,
             // and whether they gave the same bits.
             std::printf(
                 "%-8d %-8s %8d %11.1f %12.1f %14.3e %8.0f%% %6.0f%% %5.0f%% %9.4f %6.0f%% %-6s "
                 "%5.1f%%%s\n",
-                nodes, sloping ? "sloping" : "flat", steps, 1e6 * c.step, 1e6 * c.wallStep,
-                nodes / c.step, 100.0 * e, 100.0 * s, 100.0 * (1.0 - e - s), c.maxEta,
-                100.0 * c.ownSolves / c.solves, c.identical ? "same" : "DIFFER",
+                nodes, k.processes ? "beach" : (sloping ? "sloping" : "flat"), steps, 1e6 * c.step,
+                1e6 * c.wallStep, nodes / c.step, 100.0 * e, 100.0 * s, 100.0 * (1.0 - e - s),
+                c.maxEta, 100.0 * c.ownSolves / c.solves, c.identical ? "same" : "DIFFER",
                 100.0 * c.timers / c.step, c.blewUp ? " blew up" : "");
             std::fflush(stdout);
         }

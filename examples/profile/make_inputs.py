@@ -49,7 +49,9 @@ def main():
     # a zigzag at the grid scale; offshore it would take height from the waves.
     write_profile("filter.csv", nx, lambda x: FILTER if x >= FILTER_FROM - 1e-9 else 0.0)
     index = lambda x: round(x / DX)
-    print(f"{nx} points, generation node {index(SOURCE)}, gauges "
+    # The generation record names a node, counted from 1: the point at x has
+    # number x / DX + 1. Output points are grid indices, counted from 0.
+    print(f"{nx} points, generation node {index(SOURCE) + 1}, gauges "
           + ", ".join(f"{index(x)} ({-bed(x):.2f} m deep)" for x in GAUGES))
 
 

@@ -228,6 +228,20 @@ void SetupBoundCondBW(BwModel& model) {
     SetDirections(model.VelocitySet, velocity);
     SetDirections(model.ElevationSet, elevation);
     SetDirections(model.AuxSet, aux);
+
+    // A generation node inside a sponge layer feeds water that the sponge
+    // damps at once: the surface piles up at the node and the waves leave
+    // weak. The run goes on; the user is told where.
+    if (model.spongeType > 0)
+        for (const BoundaryNode& r : model.VelocitySet.records)
+            if (r.nodeType == kNodeGeneration && model.spongeVelocity[r.node] < 1.0) {
+                char text[160];
+                std::snprintf(text, sizeof text,
+                              "SetupBoundCondBW: the generation node at x = %g m lies in the "
+                              "sponge layer (coefficient %g); put the sponge behind it",
+                              velocity.x[r.node], 1.0 / model.spongeVelocity[r.node]);
+                ReportUserWarning(text);
+            }
 }
 
 void UpdateForcingsBW(double t, BwModel& model) {

@@ -81,6 +81,35 @@ void SpecDepthBW(BwModel& model) {
     WriteSimulationInformation(mesh, model.StillDepth, model.TimeStep);
 }
 
+// The water in the slot of a dry point carries waves at about
+// sqrt(g (eta - depth)), without the dispersion that slows the shortest
+// waves of the grid in the water: above a Courant number of about 0.6
+// on the dry points it grows a wiggle from point to point (measured on a
+// beach of 0.05 m elements). The user is told before the run.
+void CheckSlotStep(const BwModel& model) {
+    const SlotSettingsBW& s = model.Slot;
+    const Mesh& mesh = MeshOf(model.ElevationMesh);
+    const double slotDepth = std::min(-s.depth, s.maxDepth);
+    if (slotDepth <= 0.0) return;
+    double shortest = 0.0;
+    for (int32_t e = 1; e <= mesh.ElementCount; ++e) {
+        const int32_t a = GetElementNode(mesh, e, 1), b = GetElementNode(mesh, e, 2);
+        if (model.StillDepth[a] < 0.0 && model.StillDepth[b] < 0.0 &&
+            (shortest == 0.0 || mesh.ElementLength[e] < shortest))
+            shortest = mesh.ElementLength[e];
+    }
+    if (shortest <= 0.0) return;  // no dry element at the start
+    const double courant = std::sqrt(kGravityBW * slotDepth) * model.TimeStep / shortest;
+    if (courant <= 0.6) return;
+    char text[256];
+    std::snprintf(text, sizeof text,
+                  "SpecSlotBW: the slot water of the dry points carries waves at %.3g m/s, a "
+                  "Courant number of %.2f; above about 0.6 it grows a wiggle from point to point "
+                  "and stops the run: a slot depth nearer the still water or a shorter step",
+                  std::sqrt(kGravityBW * slotDepth), courant);
+    ReportUserWarning(text);
+}
+
 void SpecSlotBW(BwModel& model) {
     NodeVector(model.SlotWidth, MeshOf(model.ElevationMesh), 1.0);
     SlotSettingsBW& s = model.Slot;
@@ -95,6 +124,7 @@ void SpecSlotBW(BwModel& model) {
         KvtGetDouble("friction_coefficient", s.friction);
     }
     KvtCloseSection();
+    if (s.type > 0) CheckSlotStep(model);
 }
 
 // r on the geometry mesh: 1 a friction factor (r = f / 2), 2 Chezy and

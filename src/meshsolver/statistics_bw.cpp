@@ -147,6 +147,10 @@ void SetupWaveStatisticBW(BwModel& model) {
         KvtGetInteger("Type_of_mean_calculation", s.meanCalculation);
         KvtGetInteger("first_time_step", s.first_time_step);
         KvtGetInteger("last_time_step", s.last_time_step);
+        // The model reader writes this key with a capital, and keys are
+        // matched as written: the end of the statistics that the model
+        // file gives would otherwise never arrive.
+        KvtGetInteger("Last_time_step", s.last_time_step);
         KvtGetInteger("time_step_frequency", s.time_step_frequency);
         KvtGetInteger("Number_of_first_waves", s.firstWaves);
         KvtGetDouble("High_elevation_limit", s.highLimit);

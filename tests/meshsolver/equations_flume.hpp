@@ -4,7 +4,7 @@
 // setup makes them (velocity node type 3 and auxiliary node type 2, both of
 // value 0), the model record ready for the integrator; the boundary codes
 // read into it from a solver file; the standing wave of one wavelength
-// between its walls; and a 1DH model file run by the engine.
+// between its walls.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -26,8 +26,7 @@
 #include "meshsolver/equations_bw.hpp"
 #include "meshsolver/run_mesh_solver.hpp"
 #include "platform/kvt/kvt.hpp"
-#include "support/model_builder.hpp"
-#include "support/test_support.hpp"
+#include "profile_run.hpp"
 
 namespace bwtest {
 
@@ -149,12 +148,6 @@ inline double SurfaceVolume(const BwModel& m) {
     return v;
 }
 
-// Linear theory of the equations: omega^2 = g d k^2 (1 + B (kd)^2) / (1 + (B + 1/3)(kd)^2).
-inline double TheoryOmega(double k, double d, double B) {
-    const double kd2 = (k * d) * (k * d);
-    return std::sqrt(9.81 * d * k * k * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
-}
-
 // A standing wave of one wavelength (wave number kd) between the walls of a
 // flat flume 1 m deep, from rest with the surface amplitude cos(k x): the
 // period from the zero crossings of the surface at the left wall, the
@@ -192,22 +185,6 @@ inline StandingWave RunStandingWave(double kd, int32_t formulation, double beta,
     w.period = crossings > 1 ? 2.0 * (last - first) / (crossings - 1) : 0.0;
     w.surface = m.Elevation;
     return w;
-}
-
-// Writes dir/m.bw, a 1DH model over the line `bathymetry` with the sections
-// `given`, and runs the engine on it there: -check if asked, the progress
-// channel (and with it the kill file) only if asked.
-inline RunResult RunProfileModel(const TempDir& dir,
-                                 const std::map<std::string, std::string>& given, bool check,
-                                 const std::string& bathymetry = "line.xol1",
-                                 bool progress = false) {
-    WriteFile(dir / "m.bw", ModelText(bathymetry, ProfileSections(given)));
-    std::vector<std::string> argv = {BuiltProgram("bw")};
-    if (check) argv.push_back("-check");
-    argv.push_back("m.bw");
-    std::map<std::string, std::string> env = {{"OMP_NUM_THREADS", "1"}};
-    if (!progress) env["TARN_PROGRESS"] = "NONE";
-    return RunProgram(argv, dir.path.string(), env, {"BUILDMODE", "TRF", "TARN_PROGRESS"});
 }
 
 }  // namespace bwtest

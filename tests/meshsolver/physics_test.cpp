@@ -91,23 +91,6 @@ double WavelengthOf(const std::vector<double>& crossings) {
     return 2.0 * (crossings.back() - crossings.front()) / static_cast<double>(crossings.size() - 1);
 }
 
-// The phase of v(t) = A cos(omega t) + B sin(omega t) + C fitted to samples
-// v[i] at t = origin + i step that span whole periods, and its amplitude:
-// v = R cos(omega t - phase) + C, phase atan2(B, A).
-struct Harmonic {
-    double amplitude = 0.0, phase = 0.0;
-};
-Harmonic FitHarmonic(const std::vector<double>& v, double origin, double step, double omega) {
-    double A = 0.0, B = 0.0;
-    const double n = static_cast<double>(v.size());
-    for (size_t i = 0; i < v.size(); ++i) {
-        const double t = origin + static_cast<double>(i) * step;
-        A += 2.0 / n * v[i] * std::cos(omega * t);
-        B += 2.0 / n * v[i] * std::sin(omega * t);
-    }
-    return {std::hypot(A, B), std::atan2(B, A)};
-}
-
 struct DrivenWave {
     double theoryK = 0.0, theoryC = 0.0;
     double celerity = 0.0;    // from the phase shift between two gauges
@@ -170,10 +153,8 @@ DrivenWave RunDrivenWave(int32_t codeType, Equations e, double kd, int32_t perWa
             h2.push_back(m.Elevation[gauge2]);
         }
     }
-    // Over whole periods the fit separates the wave from the still level
-    // that the soft start leaves behind the front.
-    const Harmonic p1 = FitHarmonic(h1, (from + 1) * dt, dt, omega);
-    const Harmonic p2 = FitHarmonic(h2, (from + 1) * dt, dt, omega);
+    const bwtest::Harmonic p1 = bwtest::FitHarmonic(h1, (from + 1) * dt, dt, omega);
+    const bwtest::Harmonic p2 = bwtest::FitHarmonic(h2, (from + 1) * dt, dt, omega);
     const double distance = line.x[gauge2] - line.x[gauge1];
     double shift = p2.phase - p1.phase;
     shift += 2.0 * kPi * std::round((k * distance - shift) / (2.0 * kPi));

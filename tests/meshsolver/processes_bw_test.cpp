@@ -182,7 +182,6 @@ struct RollerCase {
 TEST(CalcBreakingBW, RollerOnASteepFrontFace) {
     RollerCase c(200, 150);
     c.Stage(0.1);
-    const double t = c.b.tanInitial;
     EXPECT_DOUBLE_EQ(c.b.slope[149], -0.5);
     EXPECT_DOUBLE_EQ(c.b.slope[150], 0.0);
     int32_t first = 0, last = 0;
@@ -199,12 +198,6 @@ TEST(CalcBreakingBW, RollerOnASteepFrontFace) {
         EXPECT_GT(c.b.delta[k], 0.0) << k;
         EXPECT_LT(c.b.delta[k], c.eta[k]) << k;
     }
-    // The line of slope t from the toe (x0 just left of 150, eta0 small)
-    // lies above the surface at first - 1 and below it at first.
-    const double x0 = 150.0 - (t - 0.25) / 0.5;
-    const double eta0 = 0.25 * (150.0 - x0) * (150.0 - x0) + 0.25 * (150.0 - x0);
-    EXPECT_LE(c.eta[first - 1] - eta0 - (x0 - (first - 1)) * t, 0.0);
-    EXPECT_GT(c.eta[first] - eta0 - (x0 - first) * t, 0.0);
     const double c0 = 1.3 * std::sqrt(9.81 * 10.0);
     EXPECT_EQ(c.b.celerity[first - 2], 0.0);
     EXPECT_NEAR(c.b.celerity[first - 1], c0, 1e-12);

@@ -1,6 +1,7 @@
 // The processes of a 1DH run against theory, each from a model file: waves
 // made on a generation node inside the flume, absorbed by sponge layers at
-// both ends; linear shoaling on a mild slope.
+// both ends; linear shoaling on a mild slope; rollers on a beach; the runup
+// of a solitary wave.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -20,15 +21,13 @@ std::string DeepTerms() {
     return "Deep_Water_Terms = true\nDispersion_Factor = 0.0666666667\n";
 }
 
-// A sponge of `width` m at both ends of a line of n + 1 points dx apart,
-// rising quadratically from 1 to `end` at the walls.
-std::vector<float> SpongeMap(int n, double dx, double width, double end) {
+// Sponges of `left` and `right` m at the ends of a line of n + 1 points dx
+// apart, rising quadratically from 1 to 1.5 at the walls.
+std::vector<float> SpongeMap(int n, double dx, double left, double right) {
     std::vector<float> s(n + 1, 1.0f);
-    for (int j = 0; j <= n; ++j) {
-        const double in = std::min(j * dx, (n - j) * dx);
-        if (in < width)
-            s[j] = static_cast<float>(1.0 + (end - 1.0) * std::pow(1.0 - in / width, 2));
-    }
+    for (int j = 0; j <= n; ++j)
+        for (auto [in, width] : {std::pair{j * dx, left}, std::pair{(n - j) * dx, right}})
+            if (in < width) s[j] = static_cast<float>(1.0 + 0.5 * std::pow(1.0 - in / width, 2));
     return s;
 }
 
@@ -66,7 +65,7 @@ Envelope RunAndFit(int32_t steps, double dt, double T, int32_t periods) {
     Envelope e;
     e.amplitude.assign(n + 1, 0.0);
     for (int32_t i = 1; i <= n && ok; ++i)
-        e.amplitude[i] = bwtest::FitSine(series[i], dt, kTwoPi / T).amplitude;
+        e.amplitude[i] = bwtest::FitHarmonic(series[i], 0.0, dt, kTwoPi / T).amplitude;
     return e;
 }
 
@@ -74,13 +73,8 @@ Envelope RunAndFit(int32_t steps, double dt, double T, int32_t periods) {
 // theory of the equations: a = Q / (cg (1 + (B + 1/3)(kd)^2)), which is Q / c
 // without the deep-water terms.
 double SourceAmplitude(double Q, double T, double d, double B) {
-    const double k = bwtest::WaveNumberOf(T, d, B), dk = 1e-6 * k;
-    const auto omega = [&](double kk) {
-        const double kd2 = kk * d * kk * d;
-        return std::sqrt(9.81 * d * kk * kk * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
-    };
-    const double cg = (omega(k + dk) - omega(k - dk)) / (2.0 * dk);
-    return Q / (cg * (1.0 + (B + 1.0 / 3.0) * k * d * k * d));
+    const double kd = bwtest::WaveNumberOf(T, d, B) * d;
+    return Q / (bwtest::GroupVelocity(T, d, B) * (1.0 + (B + 1.0 / 3.0) * kd * kd));
 }
 
 // A generation node in the middle of a flume of 1 m water sends a wave of
@@ -103,7 +97,7 @@ TEST(GenerationAndSponge, WavesLeaveTheSourceBothWaysAtTheAmplitudeOfTheoryAndAr
         bwtest::TempDir dir;
         bwtest::WriteProfile(dir / "bed.xol1", dx,
                              std::vector<float>(n + 1, -static_cast<float>(d)));
-        bwtest::WriteProfile(dir / "sponge.xol1", dx, SpongeMap(n, dx, sponge, 1.5), "Sponge");
+        bwtest::WriteProfile(dir / "sponge.xol1", dx, SpongeMap(n, dx, sponge, sponge), "Sponge");
         const int32_t steps = 26 * perPeriod;
         bwtest::WriteSeriesFile(
             dir / "gen.xol0", "2004-01-01 00:00:00", dt,
@@ -135,16 +129,6 @@ TEST(GenerationAndSponge, WavesLeaveTheSourceBothWaysAtTheAmplitudeOfTheoryAndAr
             EXPECT_LT(kr * kr, 0.05) << from;
         }
     }
-}
-
-// The group velocity of the equations' relation.
-double GroupVelocity(double T, double d, double B) {
-    const double k = bwtest::WaveNumberOf(T, d, B), dk = 1e-6 * k;
-    const auto omega = [&](double kk) {
-        const double kd2 = kk * d * kk * d;
-        return std::sqrt(9.81 * d * kk * kk * (1.0 + B * kd2) / (1.0 + (B + 1.0 / 3.0) * kd2));
-    };
-    return (omega(k + dk) - omega(k - dk)) / (2.0 * dk);
 }
 
 // Waves from a source in 0.5 m of water climb a slope of 1:50 onto a shelf of
@@ -191,11 +175,11 @@ TEST(Shoaling, HeightOnAMildSlopeKeepsTheEnergyFluxOfTheRelation) {
     const auto around = [&](double x, double L) {
         return e.Mean(node(x - L / 2.0), node(x + L / 2.0));
     };
-    const double a0 = around(toe - L0, L0), cg0 = GroupVelocity(T, d0, kB);
+    const double a0 = around(toe - L0, L0), cg0 = bwtest::GroupVelocity(T, d0, kB);
     for (double x : {toe + 0.5 * (top - toe), top + 1.5 * L1}) {
         const double depth = std::clamp(d0 - (x - toe) * slope, d1, d0);
         const double L = kTwoPi / bwtest::WaveNumberOf(T, depth, kB);
-        const double theory = a0 * std::sqrt(cg0 / GroupVelocity(T, depth, kB));
+        const double theory = a0 * std::sqrt(cg0 / bwtest::GroupVelocity(T, depth, kB));
         std::printf("depth %.3f m: amplitude %.5f, theory %.5f (%+.2f %%), a0 %.5f\n", depth,
                     around(x, L), theory, 100.0 * (around(x, L) / theory - 1.0), a0);
         EXPECT_NEAR(around(x, L) / theory, 1.0, 0.03) << depth;
@@ -227,20 +211,17 @@ Beach1D RunBeach1D(bool rollers) {
     const double back = 1.5 * L, flat = back + 1.5 * L;  // sponge behind, then flat bed to the toe
     const int n = static_cast<int>(std::lround((flat + (kDepth - kEnd) / kSlope) / kDx));
     const int source = static_cast<int>(std::lround((back + 0.3) / kDx));
-    std::vector<float> bed(n + 1), sponge(n + 1, 1.0f), filter(n + 1, 0.0f);
+    std::vector<float> bed(n + 1), filter(n + 1, 0.0f);
     Beach1D out;
     for (int j = 0; j <= n; ++j) {
         const double x = j * kDx;
         out.x.push_back(x - flat);
         bed[j] = static_cast<float>(-kDepth + std::max(x - flat, 0.0) * kSlope);
         if (x - flat > 5.0) filter[j] = 0.1f;
-        if (x < back) sponge[j] = static_cast<float>(1.0 + 0.5 * std::pow(1.0 - x / back, 2));
-        const double in = (n * kDx - x) / kSponge;
-        if (in < 1.0) sponge[j] = static_cast<float>(1.0 + 0.5 * (1.0 - in) * (1.0 - in));
     }
     bwtest::TempDir dir;
     bwtest::WriteProfile(dir / "bed.xol1", kDx, bed);
-    bwtest::WriteProfile(dir / "sponge.xol1", kDx, sponge, "Sponge");
+    bwtest::WriteProfile(dir / "sponge.xol1", kDx, SpongeMap(n, kDx, back, kSponge), "Sponge");
     bwtest::WriteProfile(dir / "filter.xol1", kDx, filter, "Filter");
     const double dt = kT / kPerPeriod;
     const int32_t steps = kPeriods * kPerPeriod, kept = kKept * kPerPeriod;
@@ -309,6 +290,83 @@ TEST(Rollers1D, OnABeachTheHeightPeaksAndFallsThroughTheSurfZoneTheMeanLevelFall
     // the run stops, or stand far higher near the wall.
     const Beach1D plain = RunBeach1D(false);
     EXPECT_TRUE(plain.blewUp || plain.height[end] > 1.3 * b.height[end]);
+}
+
+}  // namespace
+
+namespace {
+
+// The runup of a solitary wave on a plane beach, from the runup output of a
+// 1DH run with the moving shoreline, against the runup law of Synolakis
+// (1987) for waves that do not break: R / d = 2.831 sqrt(cot beta) (H / d)^(5/4).
+// A flume of 1 m water: a generation node 40 m from the left wall with a
+// sponge behind it, the toe of a 1:19.85 slope 30 m further on, the beach
+// up to 0.15 m above the still water, then a wall. The node sends a
+// solitary wave of height H each way (the flux c eta of the wave, c =
+// sqrt(g (d + H))); the one to the right runs up the beach. A gauge 10 m
+// before the toe measures the height that arrives (the incoming height),
+// the highest "Vertical runup" is the runup.
+std::pair<double, double> RunSolitaryWave(double H, double dx, double dt) {
+    const double d = 1.0, cotBeta = 19.85, g = 9.81;
+    const double source = 40.0, toe = 70.0, top = 0.15;
+    const int n = static_cast<int>(std::lround((toe + (d + top) * cotBeta) / dx));
+    std::vector<float> bed(n + 1);
+    for (int j = 0; j <= n; ++j)
+        bed[j] = static_cast<float>(-d + std::max(j * dx - toe, 0.0) / cotBeta);
+    bwtest::TempDir dir;
+    bwtest::WriteProfile(dir / "bed.xol1", dx, bed);
+    bwtest::WriteProfile(dir / "sponge.xol1", dx, SpongeMap(n, dx, 30.0, 0.0), "Sponge");
+    const int steps = static_cast<int>(std::lround(45.0 / dt));
+    const double c = std::sqrt(g * (d + H)), K = std::sqrt(3.0 * H / (4.0 * d * d * d));
+    const double t0 = 5.0 / (K * c);
+    std::vector<float> flux(steps + 2), zero(steps + 2, 0.0f);
+    for (int s = 0; s < steps + 2; ++s) {
+        const double sech = 1.0 / std::cosh(K * c * (s * dt - t0));
+        flux[s] = static_cast<float>(c * H * sech * sech);
+    }
+    bwtest::WriteSeriesFile(dir / "gen.xol0", "2004-01-01 00:00:00", dt, {flux, zero});
+    const std::string at = std::to_string(std::lround(source / dx));
+    const std::string gauge = std::to_string(std::lround((toe - 10.0) / dx));
+    const bwtest::RunResult r = bwtest::RunProfileModel(
+        dir,
+        {{"Simulation_Period", bwtest::Period(steps, dt)},
+         {"MOVING_SHORELINE",
+          "type = 1\ndepth = -0.2\nwidth = 0.01\nsmoothing_parameter = 100\n"
+          "friction_coefficient = 0.1\n"},
+         {"Sponge", "Sponge_Type = true\n" + bwtest::DataFileSection("sponge.xol1")},
+         {"Internal_Generation",
+          "Number_Of_Records = 1\n" +
+              bwtest::GenerationRecord(1, std::stoi(at), 0, std::stoi(at), 0, 0, "gen.xol0")},
+         {"OUTPUT_DETERMINISTIC_1D",
+          bwtest::One(bwtest::Places("gauge.xol0", gauge, 1) + bwtest::Span(0, steps, 1, "3"))},
+         {"OUTPUT_MOVING_SHORELINE_1D",
+          "INCLUDE_CALCULATION = true\n" +
+              bwtest::Record(
+                  1, "File_Name = file(\"runup.xol0\")\n" + bwtest::Span(0, steps, 1, "1, 2, 3"))}},
+        false, "bed.xol1");
+    EXPECT_EQ(r.exitCode, 0) << r.out << r.err;
+    double incoming = 0.0, runup = 0.0;
+    for (const auto& record : bwtest::ReadDataFile(dir / "gauge.xol0").records)
+        incoming = std::max(incoming, static_cast<double>(record[0][0]));
+    for (const auto& record : bwtest::ReadDataFile(dir / "runup.xol0").records)
+        runup = std::max(runup, static_cast<double>(record[1][0]));
+    return {incoming, runup};
+}
+
+// A non-breaking wave on 1:19.85 (H / d below 0.818 (cot beta)^(-10/9) =
+// 0.031), at a grid and step a user would choose: 20 points over the
+// wave's half-width 1 / K, a Courant number of 0.3. The slot lies 0.2 m
+// under the still water: the slot adds L (w + 1/s) of depth to every node
+// within L of its bottom, and a slot 1 m deep took 10 to 30 % off the
+// runup. Its friction of 0.1 keeps the slot water under the dry beach from
+// draining below the slot's bottom after the wave has gone back.
+TEST(Runup, ASolitaryWaveClimbsAPlaneBeachAsTheRunupLawSays) {
+    const double H = 0.01;
+    const auto [incoming, runup] = RunSolitaryWave(H, 0.05, 0.005);
+    const double law = 2.831 * std::sqrt(19.85) * std::pow(incoming, 1.25);
+    std::printf("H/d target %.4f, arrived %.4f: runup %.4f m, law %.4f m (%+.1f %%)\n", H, incoming,
+                runup, law, 100.0 * (runup / law - 1.0));
+    EXPECT_NEAR(runup / law, 1.0, 0.10);
 }
 
 }  // namespace

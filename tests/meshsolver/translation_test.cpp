@@ -12,10 +12,10 @@
 
 namespace {
 
-using Sections = std::map<std::string, std::string>;
+using bwtest::BoundaryRecord;
+using bwtest::Record;
+using bwtest::Sections;
 using Values = std::vector<std::pair<std::string, std::string>>;
-
-constexpr int kJ = 20;  // points 0..20 of a line 2.5 m apart: nodes 1..21
 
 // The parameter file loaded back.
 struct FemFile {
@@ -67,46 +67,24 @@ struct FemFile {
     }
 };
 
-std::string Record(int n, const std::string& body) {
-    return "OUTPUT_SPEC_DATA_" + std::to_string(n) + " {\n" + body + "}\n";
-}
-
-std::string BoundaryRecord(int j, int formulation, const std::string& file, int items) {
-    std::string numbers = "1";
-    for (int i = 2; i <= items; ++i) numbers += ", " + std::to_string(i);
-    const std::string point = std::to_string(j) + ", 0\n";
-    return "Number_Of_Boundaries = 1\nBOUNDARY_DATA_1 {\nFirst_Point = " + point +
-           "Last_Point = " + point + "Formulation = " + std::to_string(formulation) +
-           "\nData_Specification = 0\nDATA_FILE {\nFile_name = file(\"" + file +
-           "\")\nItem_Count = " + std::to_string(items) + "\nItem_Numbers = " + numbers +
-           "\n}\n}\n";
-}
-
-class Translation : public testing::Test {
+// The flume on a slope from -4 m to -1 m, and a line of its own positions.
+class Translation : public bwtest::ProfileModel {
 protected:
-    bwtest::TempDir dir;
-    std::string fem;  // the path of the written file
+    std::string fem = dir / "m.bw_FEM.kvt";  // the path of the written file
 
     void SetUp() override {
-        fem = dir / "m.bw_FEM.kvt";
         std::vector<float> bed(kJ + 1), x(kJ + 1);
         for (int j = 0; j <= kJ; ++j) {
             bed[j] = -4.0f + 0.15f * static_cast<float>(j);
             x[j] = 0.5f * static_cast<float>(j * j);
         }
-        bwtest::WriteLineFile(dir / "line.xol1", "2004-01-01 00:00:00", 1.0, 2.5f, {{bed}});
-        // A line of its own positions: x, then the bed.
+        Bed(bed);
         bwtest::WriteLineFile(dir / "xz.xol1", "2004-01-01 00:00:00", 1.0, 1.0f, {{x}, {bed}});
-    }
-
-    bwtest::RunResult Run(const Sections& given, bool check = true,
-                          const std::string& bathymetry = "line.xol1") {
-        std::filesystem::remove(fem);
-        return bwtest::RunProfileModel(dir, given, check, bathymetry);
     }
     // Runs the check and expects it to end normally with the file written.
     void Translate(const Sections& given, const std::string& bathymetry = "line.xol1") {
-        const bwtest::RunResult r = Run(given, true, bathymetry);
+        std::filesystem::remove(fem);
+        const bwtest::RunResult r = bwtest::RunProfileModel(dir, given, true, bathymetry);
         ASSERT_EQ(r.exitCode, 0) << r.out << r.err;
         ASSERT_TRUE(std::filesystem::exists(fem));
     }
@@ -118,6 +96,7 @@ protected:
 // is still reported.
 TEST_F(Translation, TheFileIsWrittenAndStaysWhateverTheDeleteFlag) {
     for (const std::string flag : {"0", "1"}) {
+        std::filesystem::remove(fem);
         const bwtest::RunResult r =
             Run({{"BASIC_MODEL_PARAMETERS",
                   "NUMBER_OF_DIMENSIONS = 1\nDELETE_FEM_KVT_FILE = " + flag + "\n"}},
@@ -143,7 +122,7 @@ TEST_F(Translation, TheFileIsWrittenAndStaysWhateverTheDeleteFlag) {
             EXPECT_NE(log.find(line), std::string::npos) << line;
     }
     const bwtest::RunResult r =
-        Run({{"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\nEps_Hihg = 0.1\n"}});
+        Run({{"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\nEps_Hihg = 0.1\n"}}, true);
     EXPECT_EQ(r.exitCode, 0);
     EXPECT_NE(r.out.find("Eps_Hihg"), std::string::npos) << r.out;
 }
@@ -294,36 +273,6 @@ TEST_F(Translation, ModelSettingsInTheSolversVocabulary) {
         SCOPED_TRACE(c.what);
         Translate(c.sections, c.bathymetry);
         FemFile(fem).Expect(c.values);
-    }
-}
-
-// The messages of the 1DH output sections that a model file can reach.
-TEST_F(Translation, BadOutputRecordsStopTheRunWithTheirMessage) {
-    const std::string det = "OUTPUT_DETERMINISTIC_1D", one = "Number_Of_Records = 1\n";
-    const std::pair<Sections, std::string> cases[] = {
-        {{{det, one + Record(1, "File_Name = file(\"out.txt\")\n")}},
-         "SetupOutputInfo1D: Wrong file extension"},
-        {{{"OUTPUT_MOVING_SHORELINE_1D",
-           "INCLUDE_CALCULATION = true\n" + Record(1, "File_Name = file(\"shore.xol3\")\n")}},
-         "SetupOutputInfo1D: Wrong file extension"},
-        {{{det, one + Record(1,
-                             "File_Name = file(\"g.xol0\")\nNO_OF_POINTS = 2\n"
-                             "X_Range_And_Interval = 3, 21\n")}},
-         "SetupOutputInfo1D: a point of X_Range_And_Interval of record 1 is 21 and lies outside "
-         "the grid (0..20)"},
-        {{{det, one + Record(1,
-                             "File_Name = file(\"g.xol0\")\nNO_OF_POINTS = 3\n"
-                             "X_Range_And_Interval = 3, 4\n")}},
-         "SetupOutputInfo1D: X_Range_And_Interval of record 1 holds 2 values where 3 are needed"},
-        {{{"OUTPUT_STATISTIC_1D", "-"}}, "KVT section: OUTPUT_STATISTIC_1D not found"},
-        {{{det, "Number_Of_Records = 2\n" + Record(1, "File_Name = file(\"a.xol0\")\n")}},
-         "KVT section: OUTPUT_SPEC_DATA_2 not found"},
-    };
-    for (const auto& [sections, message] : cases) {
-        const bwtest::RunResult r = Run(sections, true);
-        EXPECT_EQ(r.exitCode, 1) << message;
-        EXPECT_NE(r.out.find(message), std::string::npos) << r.out;
-        EXPECT_FALSE(std::filesystem::exists(fem)) << message;
     }
 }
 

@@ -18,6 +18,7 @@
 
 #include "equations_flume.hpp"
 #include "meshsolver/output_bw.hpp"
+#include "meshsolver/statistics_bw.hpp"
 #include "run/progress.hpp"
 #include "support/log_capture.hpp"
 
@@ -111,6 +112,48 @@ TEST_F(MeshSolverRun, NegativeDepthEndsTheRunUnlessTheSlotHoldsIt) {
     EXPECT_EQ(log.find("BLOW-UP"), std::string::npos) << log;
     EXPECT_NE(log.find(kStepsLine + "150"), std::string::npos);
     EXPECT_NE(log.find("Min depth                  : -0.375"), std::string::npos) << log;
+}
+
+// What the mesh solver tells before a run that goes on: a slot whose water
+// on the dry beach would carry waves beyond its step, a generation node in
+// a sponge layer. And the end of the statistics that the model gives holds
+// (the model reader writes its key with a capital).
+TEST_F(MeshSolverRun, WarningsBeforeTheRunAndTheEndOfTheStatistics) {
+    std::vector<float> beach(kJ + 1);
+    for (int j = 0; j <= kJ; ++j) beach[j] = -2.0f + 0.125f * static_cast<float>(j);  // to +0.5
+    Bed(beach);
+    const std::string slot = "type = 1\ndepth = -5\nwidth = 0.01\nsmoothing_parameter = 5\n";
+    // sqrt(9.81 x 5) = 7.0 m/s; 7.0 x 0.5 s / 2.5 m = 1.40.
+    RunResult r = Run({{"Simulation_Period", Period(1, 0.5)}, {"MOVING_SHORELINE", slot}});
+    EXPECT_NE(r.out.find("Warning: SpecSlotBW: the slot water of the dry points carries waves "
+                         "at 7 m/s, a Courant number of 1.40"),
+              std::string::npos)
+        << r.out;
+    r = Run({{"Simulation_Period", Period(1, 0.05)}, {"MOVING_SHORELINE", slot}});
+    EXPECT_EQ(r.out.find("SpecSlotBW"), std::string::npos) << r.out;
+
+    Bed(std::vector<float>(kJ + 1, -2.0f));
+    std::vector<float> sponge(kJ + 1, 1.0f);
+    sponge[0] = sponge[1] = sponge[2] = sponge[3] = 2.0f;
+    WriteProfile(dir / "sponge.xol1", kDx, sponge);
+    WriteSeriesFile(dir / "gen.xol0", "2004-01-01 00:00:00", 1.0,
+                    {std::vector<float>(12, 0.0f), std::vector<float>(12, 0.0f)});
+    const Sections generation = {
+        {"Simulation_Period", Period(5, 0.05)},
+        {"Sponge", "Sponge_Type = true\n" + DataFileSection("sponge.xol1")},
+        {"Internal_Generation",
+         "Number_Of_Records = 1\n" + GenerationRecord(1, 3, 0, 3, 0, 0, "gen.xol0")},
+        {"OUTPUT_STATISTIC_1D", "Number_Of_Records = 0\nLast_Time_Step = 3\n"}};
+    r = Run(generation);
+    EXPECT_EQ(r.exitCode, 0) << r.out << r.err;
+    // Node 3 is grid point 2, at 5 m.
+    EXPECT_NE(r.out.find("Warning: SetupBoundCondBW: the generation node at x = 5 m lies in the "
+                         "sponge layer (coefficient 2)"),
+              std::string::npos)
+        << r.out;
+    std::string out;
+    ASSERT_EQ(RunInProcess(generation, out), 0) << out;
+    EXPECT_EQ(gWaveStatisticBW.last_time_step, 3);
 }
 
 // Bed resistance by Chezy, r = g / C^2: a constant one holds the flow back,

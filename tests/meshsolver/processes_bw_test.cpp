@@ -257,6 +257,12 @@ TEST(ReadNodeMapBW, ItemOnTheNodesOfTheMesh) {
     AllocateMesh(longer, 4, 3, 2, "test");
     EXPECT_EXIT((dup2(2, 1), ReadNodeMapBW(dir / "map.xol1", 1, longer)),
                 testing::ExitedWithCode(1), "Wrong data file");
+    // A map of the grid model given to a profile.
+    bwtest::MapSpec grid;
+    grid.J = 2, grid.K = 1;
+    bwtest::WriteMapFile(dir / "map.xol2", grid, bwtest::Constant(grid, 1.0f));
+    EXPECT_EXIT((dup2(2, 1), ReadNodeMapBW(dir / "map.xol2", 1, line)), testing::ExitedWithCode(1),
+                "Wrong dimension");
 }
 
 // A line of n nodes 1 m apart and its quadratic refinement.

@@ -16,6 +16,11 @@ roller thickness along the middle row are written every step of the last
 periods; wave height is the mean crest-to-trough height of those periods,
 the mean level their time mean.
 
+With --maker source (a grid model) the waves come from a generation line
+near the west end instead, with a sponge of one and a half wavelengths
+behind it, as in a profile; give FLAT room for both and for the flat bed
+in front of the line (10.7 m leaves 6 m).
+
 With --dims 1 the same flume is a profile of the 1DH model: the waves come
 from a generation node FLAT metres before the toe (a series of the flux that
 makes the measured height, from `bwdata waves --drive source`), with a
@@ -79,6 +84,42 @@ def write_grid(path, values, dx):
             f.write(" ".join(f"{v:.6f}" for v in values[k]) + "\n")
 
 
+def wave_maker(a, ny):
+    """The sections that make the waves: a level boundary at the west end,
+    or a generation line (a.source, the grid column) with a sponge behind it."""
+    items = ("2", "1, 2") if a.deep else ("1", "1")
+    if a.maker == "level":
+        return f"""    Boundary_Location {{
+        Number_Of_Boundaries = 1
+        BOUNDARY_DATA_1 {{
+            First_Point = 0, 1
+            Last_Point = 0, {ny - 2}
+            Formulation = 0
+            Data_Specification = 0
+            DATA_FILE {{
+                File_name = file("waves.xol0")
+                Item_Count = {items[0]}
+                Item_Numbers = {items[1]}
+            }}
+        }}
+    }}
+    Internal_Generation {{ Number_Of_Records = 0 }}"""
+    return f"""    Boundary_Location {{ Number_Of_Boundaries = 0 }}
+    Internal_Generation {{
+        Number_Of_Records = 1
+        INTERNAL_GEN_DATA_1 {{
+            First_Line_Pos = {a.source}, 1
+            Last_Line_Pos = {a.source}, {ny - 2}
+            Wave_Type = 0
+            DATA_FILE {{
+                File_name = file("waves.xol0")
+                Item_Count = {items[0]}
+                Item_Numbers = {items[1]}
+            }}
+        }}
+    }}"""
+
+
 def model_text(a, nx, steps, dt, record_from):
     """The model file; a holds the options of the run."""
     ny = a.rows + 2
@@ -101,7 +142,7 @@ def model_text(a, nx, steps, dt, record_from):
         return "\n".join(f"        {k} = {v}" for k, v in sections.get(name, {}).items())
 
     sponge = "        Sponge_Type = false"
-    if a.shore == "wall":
+    if a.shore == "wall" or a.maker == "source":
         sponge = """        Sponge_Type = true
         DATA_FILE {
             File_name = file("sponge.xol2")
@@ -156,21 +197,7 @@ TARNEL_BOUSSINESQ_WAVE {{
         SURFACE_TYPE = 0
         Constant_Value = 0
     }}
-    Boundary_Location {{
-        Number_Of_Boundaries = 1
-        BOUNDARY_DATA_1 {{
-            First_Point = 0, 1
-            Last_Point = 0, {ny - 2}
-            Formulation = 0
-            Data_Specification = 0
-            DATA_FILE {{
-                File_name = file("waves.xol0")
-                Item_Count = {2 if a.deep else 1}
-                Item_Numbers = {"1, 2" if a.deep else "1"}
-            }}
-        }}
-    }}
-    Internal_Generation {{ Number_Of_Records = 0 }}
+{wave_maker(a, ny)}
     Output_Deterministic_2D {{
         Number_Of_Records = 1
         Output_Spec_Data_1 {{
@@ -211,12 +238,20 @@ def build(a):
     rows = [[LAND if k in (0, ny - 1) or j == nx - 1 else bed(j) for j in range(nx)]
             for k in range(ny)]
     write_grid(os.path.join(a.out, "bathymetry.asc"), rows, dx)
-    if a.shore == "wall":
+    # A generation line makes its waves both ways: a sponge of one and a half
+    # wavelengths behind it, rising to 1.5 at the west wall.
+    back = 1.5 * 2.0 * math.pi / wave_number(a.period, DEPTH, 1.0 / 15.0 if a.deep else 0.0)
+    a.source = int(round((back + 0.3) / dx))
+    if a.shore == "wall" or a.maker == "source":
         # A sponge over the last metres before the wall, its coefficient
         # rising with the square of the distance into it to 1.5.
         def sponge(j, k):
+            if rows[k][j] >= 0.5:
+                return 1.0
+            if a.maker == "source" and j * dx < back:
+                return 1.0 + 0.5 * (1.0 - j * dx / back) ** 2
             s = (j - (nx - 2)) * dx + a.sponge
-            if s <= 0.0 or rows[k][j] >= 0.5:
+            if s <= 0.0 or a.shore != "wall":
                 return 1.0
             return 1.0 + 0.5 * (s / a.sponge) ** 2
         write_grid(os.path.join(a.out, "sponge.asc"),
@@ -240,14 +275,21 @@ def build(a):
     with open(os.path.join(a.out, "beach.bw"), "w") as f:
         f.write(model_text(a, nx, steps, dt, record_from))
     bwdata = os.path.join(a.bin, "tools", "bwdata", "bwdata")
+    waves = [bwdata, "import-csv", "waves.csv", "-o", "waves.xol0", "--start",
+             "2026-01-01 12:00:00", "--types", "100078,999", "--units", "1000,1000",
+             "--title", "Incoming wave"]
+    if a.maker == "source":
+        waves = [bwdata, "waves", "-o", "waves.xol0", "--drive", "source", "--depth",
+                 f"{DEPTH}", "--dt", f"{dt:.10f}", "--duration", f"{(steps + 8) * dt:.6f}",
+                 "--start", "2026-01-01 12:00:00", "--height", f"{a.height}",
+                 "--period", f"{a.period}", "--ramp", f"{3 * a.period}"]
+        if a.deep:
+            waves += ["--deep", f"{B}"]
     for cmd in ([bwdata, "import-asc", "bathymetry.asc", "-o", "bathymetry.xol2",
-                 "--title", "Plane beach 1:34.3"],
-                [bwdata, "import-csv", "waves.csv", "-o", "waves.xol0", "--start",
-                 "2026-01-01 12:00:00", "--types", "100078,999", "--units", "1000,1000",
-                 "--title", "Incoming wave"]) + (
+                 "--title", "Plane beach 1:34.3"], waves) + (
                 ([bwdata, "import-asc", "sponge.asc", "-o", "sponge.xol2", "--name", "Sponge",
-                  "--type", "999", "--unit", "1000", "--title", "Sponge before the wall"],)
-                if a.shore == "wall" else ()):
+                  "--type", "999", "--unit", "1000", "--title", "Sponge layers"],)
+                if a.shore == "wall" or a.maker == "source" else ()):
         subprocess.run(cmd, cwd=a.out, check=True, stdout=subprocess.DEVNULL)
     return nx, dt, steps
 
@@ -512,6 +554,7 @@ def run(a):
                 a.start = json.load(f)["profile_start"]
         r = subprocess.CompletedProcess([], 0)
     elif a.dims == 1:
+        a.maker = "source"
         nx, dt, steps, a.start = build1d(a)
         bw = os.path.join(a.bin, "src", "bw")
         r = subprocess.run([bw, "beach.bw"], cwd=a.out, capture_output=True, text=True)
@@ -532,7 +575,7 @@ def run(a):
         return 1
     x, height, mean, dmax = analyse(a, nx)
     offset = 0.0
-    if a.dims == 1:  # the mean level from its value at the toe, see above
+    if a.dims == 1 or a.maker == "source":  # the mean level from the toe, see above
         offset = float(np.interp(0.0, x, np.ma.filled(mean, np.nan)))
         mean = mean - offset
     # Where breaking starts: the first point on the slope whose roller grows
@@ -617,6 +660,10 @@ def main(argv=None):
     r.add_argument("test", choices=sorted(TESTS))
     r.add_argument("--dims", type=int, choices=[1, 2], default=2,
                    help="1: the profile model; 2: a channel of the grid model")
+    r.add_argument("--maker", choices=["level", "source"], default="level",
+                   help="--dims 2: a level boundary at the west end, or a generation line "
+                        "with a sponge behind it (the profile's wave maker; give a --flat of "
+                        "10 m or more)")
     r.add_argument("--dx", type=float, default=0.025)
     r.add_argument("--steps-per-period", type=int, default=128)
     r.add_argument("--periods", type=int, default=30)

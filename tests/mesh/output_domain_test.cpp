@@ -49,7 +49,7 @@ protected:
     }
     // The record of a section OUTPUT_FILE_1 of the given body, in a file of
     // the given name, with one item on mesh 1.
-    OutputFile Spec(const std::string& name, const std::string& body) {
+    OutputFile ReadRecord(const std::string& name, const std::string& body) {
         if (file != 0) kvtClose(&file);
         bwtest::WriteFile(dir / "m_FEM.kvt", "MeshSolverBW {\nOUTPUT_FILE_1 {\nfile_name = \"" +
                                                  (dir / name) + "\"\n" + body + "}\n}\n");
@@ -104,7 +104,7 @@ TEST_F(OutputDomain, ElementSearchAndExtraction) {
 // A list with no point inside turns the record off, and it gets no file.
 TEST_F(OutputDomain, PointsOutsideTheMeshAreDropped) {
     bwtest::LogCapture log;
-    OutputFile r = Spec("gauges.xol0", Points({-1, 2, 3, 9}));
+    OutputFile r = ReadRecord("gauges.xol0", Points({-1, 2, 3, 9}));
     SetupOutputDomain(r);
     EXPECT_TRUE(r.active);
     ASSERT_EQ(r.pointCount, 2);
@@ -124,7 +124,7 @@ TEST_F(OutputDomain, PointsOutsideTheMeshAreDropped) {
               std::string::npos)
         << text;
 
-    std::vector<OutputFile> none = {Spec("none.xol0", Points({-5, 20}))};
+    std::vector<OutputFile> none = {ReadRecord("none.xol0", Points({-5, 20}))};
     SetupOutputDomain(none[0]);
     EXPECT_FALSE(none[0].active);
     EXPECT_NE(log.Text().find("Warning: SetupPointDomain: No points inside domain"),
@@ -138,14 +138,14 @@ TEST_F(OutputDomain, PointsOutsideTheMeshAreDropped) {
 // in an xol1 file and the delete value in another; a line of one place passes.
 TEST_F(OutputDomain, LinePlacesBeyondTheMesh) {
     const std::string area = "format = 1\ninterpolation_type = 2\nAREA {\nx_origo = -2\nx_ds = ";
-    OutputFile r = Spec("line.xol1", area + "3\nx_npoints = 4\n}\n");
+    OutputFile r = ReadRecord("line.xol1", area + "3\nx_npoints = 4\n}\n");
     SetupOutputDomain(r);
     ASSERT_EQ(r.places.size(), 4u);
     EXPECT_EQ(r.places[0].element, 0);
     EXPECT_EQ(r.places[0].y, kDelete);
     EXPECT_EQ(r.places[0].z, 10.0);
     EXPECT_EQ(r.places[3].element, 4);  // x = 7
-    r = Spec("line.xolu", area + "1\nx_npoints = 1\n}\n");
+    r = ReadRecord("line.xolu", area + "1\nx_npoints = 1\n}\n");
     SetupOutputDomain(r);
     ASSERT_EQ(r.places.size(), 1u);
     EXPECT_EQ(r.places[0].z, kDelete);
@@ -153,9 +153,9 @@ TEST_F(OutputDomain, LinePlacesBeyondTheMesh) {
     // A spacing that passed through a 32-bit real (2.0000000298) still puts
     // the places on the nodes, the last one too: a node's value is its own,
     // and a neighbour without a statistic (-1e-30) leaks nothing into it.
-    r = Spec("line.xol1",
-             "format = 1\ninterpolation_type = 2\nAREA {\nx_origo = 0\nx_ds = 2.0000000298\n"
-             "x_npoints = 5\n}\n");
+    r = ReadRecord("line.xol1",
+                   "format = 1\ninterpolation_type = 2\nAREA {\nx_origo = 0\nx_ds = 2.0000000298\n"
+                   "x_npoints = 5\n}\n");
     SetupOutputDomain(r);
     ASSERT_EQ(r.places.size(), 5u);
     EXPECT_EQ(r.places[4].element, 4);
@@ -175,10 +175,10 @@ TEST_F(OutputDomainDeathTest, SettingsAFileCantHave) {
          "SetupAreaDomain: Number of points must be larger than one"},
         {"l.xol1", "format = 3\n", "SpecOutputDomain: Output format not supported"}};
     for (const auto& c : cases) {
-        OutputFile r = Spec(c[0], c[1]);
+        OutputFile r = ReadRecord(c[0], c[1]);
         EXPECT_EXIT((dup2(2, 1), SetupOutputDomain(r)), testing::ExitedWithCode(1), c[2]) << c[1];
     }
-    std::vector<OutputFile> records = {Spec("l.xol1", "format = 1\nAREA {\n}\n")};
+    std::vector<OutputFile> records = {ReadRecord("l.xol1", "format = 1\nAREA {\n}\n")};
     SetupOutputDomain(records[0]);
     double v = 0.0;
     EXPECT_EXIT(
@@ -189,7 +189,7 @@ TEST_F(OutputDomainDeathTest, SettingsAFileCantHave) {
                 "OpenOutputFiles: Output format not supported");
     EXPECT_EXIT((dup2(2, 1), CloseOutputFiles(1, records)), testing::ExitedWithCode(1),
                 "Output format not supported, file: .*l.xol1");
-    EXPECT_EXIT((dup2(2, 1), Spec("p.xol0", "time_step_frequency = 0\n")),
+    EXPECT_EXIT((dup2(2, 1), ReadRecord("p.xol0", "time_step_frequency = 0\n")),
                 testing::ExitedWithCode(1), "time_step_frequency must be at least 1");
 }
 

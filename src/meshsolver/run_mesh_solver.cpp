@@ -149,9 +149,7 @@ std::string MeshSolverLogName(const std::string& path) {
     return path.substr(0, at) + ".log";
 }
 
-void RunMeshSolver(const std::string& solverFile, std::string& parameterFileName,
-                   int32_t& runStatus) {
-    StartTiming(gOverallTiming, kTaskPreProcessing);
+KvtHandle SetupMeshSolver(const std::string& solverFile) {
     int status = 0;
     KvtHandle file = KvtOpenFile(solverFile, false, &status);
     if (status != 0) StopRun("Unable to open " + solverFile);
@@ -169,6 +167,13 @@ void RunMeshSolver(const std::string& solverFile, std::string& parameterFileName
     gProgress.timeStep = gMeshRun.TimeStepInterval;
     SetupSpaceDiscretization(dimensions);
     SetupBW(dimensions);
+    return file;
+}
+
+void RunMeshSolver(const std::string& solverFile, std::string& parameterFileName,
+                   int32_t& runStatus) {
+    StartTiming(gOverallTiming, kTaskPreProcessing);
+    KvtHandle file = SetupMeshSolver(solverFile);
     StopTiming(gOverallTiming, kTaskPreProcessing);
 
     if (!RunTimeLoop(runStatus)) return;

@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <string>
 
+#include "platform/kvt/kvt.hpp"
 #include "run/datetime.hpp"
 #include "run/timing.hpp"
 
@@ -37,6 +38,10 @@ enum ShortWaveTask {
 void RunMeshSolver(const std::string& solverFile, std::string& parameterFileName,
                    int32_t& runStatus);
 
+// Opens the solver file ("Unable to open " when it can't) and sets up the
+// time axis, the meshes and the Boussinesq module from it; the file stays
+// open for the run and is handed back for its close.
+KvtHandle SetupMeshSolver(const std::string& solverFile);
 // TIME of the solver file: start, step and number of steps.
 void SetupTimeAxis();
 // The BOUSSINESQ_WAVE_MODULE section: equations, processes, start state,

@@ -123,19 +123,9 @@ inline void SetUpProfileRun(const TempDir& dir, double dt, const Sections& secti
     ASSERT_EQ(r.exitCode, 0) << r.out << r.err;
 
     testing::internal::CaptureStdout();
-    KvtHandle file = KvtOpenFile(dir / "m.bw_FEM.kvt", false);
-    KvtUseFile(file);
-    KvtOpenTarget("MeshSolverBW");
-    int32_t dimensions = 1;
-    KvtOpenSection("BASIC_MODEL_PARAMETERS");
-    KvtGetInteger("number_of_dimensions", dimensions);
-    KvtCloseSection();
-    gMeshRun = MeshRunState{};
     ResetMeshModel();
     ResetBwModel();
-    SetupTimeAxis();
-    SetupSpaceDiscretization(dimensions);
-    SetupBW(dimensions);
+    KvtHandle file = SetupMeshSolver(dir / "m.bw_FEM.kvt");
     kvtClose(&file);
     testing::internal::GetCapturedStdout();
     UpdateForcingsBW(0.0, gBwModel);

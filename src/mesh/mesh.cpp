@@ -40,6 +40,14 @@ void AllocateMesh(Mesh& mesh, int32_t n, int32_t m, int32_t nodesPerElement, con
     for (int32_t e = 1; e <= m + 1; ++e) mesh.ElementStart[e] = (e - 1) * nodesPerElement + 1;
 }
 
+void MakeLineElements(Mesh& line) {
+    for (int32_t e = 1; e <= line.ElementCount; ++e) {
+        line.ElementType[e] = kLinearLine;
+        line.ElementNodes[line.ElementStart[e]] = e;
+        line.ElementNodes[line.ElementStart[e] + 1] = e + 1;
+    }
+}
+
 void RefineMesh(const Mesh& line, Mesh& refined) {
     const int32_t n = line.NodeCount;
     const int32_t nodes = n > 0 ? 2 * n - 1 : 0;

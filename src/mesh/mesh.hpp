@@ -66,6 +66,10 @@ inline int32_t GetElementNode(const Mesh& mesh, int32_t e, int32_t k) {
 // nodesPerElement nodes each, all active, in compressed rows.
 void AllocateMesh(Mesh& mesh, int32_t n, int32_t m, int32_t nodesPerElement, const char* context);
 
+// The n - 1 linear elements of a line of n nodes (allocated for them):
+// element e runs from node e to node e + 1.
+void MakeLineElements(Mesh& line);
+
 // The quadratic line made from a linear one: 2n - 1 nodes, the old node i
 // becoming node 2i - 1 with its code, and a middle node 2i of code 0 between
 // old nodes i and i + 1. Element e has the nodes 2e - 1, 2e + 1, 2e.

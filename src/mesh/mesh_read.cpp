@@ -84,9 +84,5 @@ void ReadMeshBasicXol1(const std::string& path, Mesh& mesh) {
     }
     mesh.projection = "NON-UTM";
     mesh.dimension = 1;
-    for (int32_t e = 1; e <= elements; ++e) {
-        mesh.ElementType[e] = kLinearLine;
-        mesh.ElementNodes[mesh.ElementStart[e]] = e;
-        mesh.ElementNodes[mesh.ElementStart[e] + 1] = e + 1;
-    }
+    MakeLineElements(mesh);
 }

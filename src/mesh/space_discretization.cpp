@@ -78,12 +78,7 @@ void SetupSpaceDiscretization(int32_t /*dimensions*/) {
     if (t.number_of_meshes == 1) {
         int32_t type = 0;
         KvtGetInteger("type_of_mesh", type);
-        if (type > 0) {
-            RefineMesh(t.meshes[1], t.meshes[2]);
-            t.number_of_meshes = 2;
-            t.meshes[2].id = 2;
-            SetupMeshTopology(t.meshes[2]);
-        }
+        if (type > 0) AddQuadraticMesh();
     }
 
     int32_t gauss = 3;
@@ -115,4 +110,12 @@ void WriteMeshInformation(const Mesh& mesh) {
     WriteLabelled("Min z-coordinate (m)       : %", lo[2]);
     WriteLabelled("Max z-coordinate (m)       : %", hi[2]);
     WriteBlockHeading("");
+}
+
+void AddQuadraticMesh() {
+    MeshTable& t = gMeshes;
+    RefineMesh(t.meshes[1], t.meshes[2]);
+    t.number_of_meshes = 2;
+    t.meshes[2].id = 2;
+    SetupMeshTopology(t.meshes[2]);
 }

@@ -22,5 +22,9 @@ void SetupSpaceDiscretization(int32_t dimensions);
 void TreatMesh(Mesh& mesh, double datumDepth, double minimumDepth, double thresholdDepth,
                const int32_t* nodes, const int32_t* codes, int32_t count);
 
+// Mesh 2 of the table becomes the quadratic refinement of the line of mesh
+// 1, with its element shapes, lengths and code sections.
+void AddQuadraticMesh();
+
 // The block "Mesh information" of one mesh.
 void WriteMeshInformation(const Mesh& mesh);

@@ -29,6 +29,7 @@
 #include "input/kvt_current.hpp"
 #include "mesh/mesh.hpp"
 #include "mesh/shape.hpp"
+#include "mesh/space_discretization.hpp"
 #include "meshsolver/boundary_bw.hpp"
 #include "meshsolver/bw_model.hpp"
 #include "meshsolver/equations_bw.hpp"
@@ -81,17 +82,10 @@ BwModel& BuildFlume(int32_t nodes, bool sloping) {
     }
     line.code[1] = kInflowCode;
     line.code[nodes] = kWallCode;
-    for (int32_t e = 1; e <= elements; ++e) {
-        line.ElementType[e] = kLinearLine;
-        line.ElementNodes[line.ElementStart[e]] = e;
-        line.ElementNodes[line.ElementStart[e] + 1] = e + 1;
-    }
+    MakeLineElements(line);
     line.id = 1;
-    RefineMesh(line, gMeshes.meshes[2]);
-    gMeshes.meshes[2].id = 2;
-    gMeshes.number_of_meshes = 2;
-    SetupMeshTopology(gMeshes.meshes[1]);
-    SetupMeshTopology(gMeshes.meshes[2]);
+    SetupMeshTopology(line);
+    AddQuadraticMesh();
     FillShapeFunctions(3);
 
     BwModel& m = gBwModel;

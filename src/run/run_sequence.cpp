@@ -127,7 +127,13 @@ void RunMain(int argc, const char* const* argv) {
     // What the file holds and no setting read: mistyped or misplaced keys.
     KvtWarnUnread(gRun.parameterFileHandle);
     if (gRun.checkOnly) {
-        // bw -check: everything is read and checked; the run ends here.
+        // bw -check: everything is read and checked; the run ends here. A
+        // profile is set up by the mesh solver from its file as well: its
+        // maps, codes and output places are read, its slot and sponges checked.
+        if (gBasic.numberOfDimensions == 1) {
+            KvtHandle solver = SetupMeshSolver(gMeshSolverFileName);
+            kvtClose(&solver);
+        }
         WriteModelCheck();
         StopTiming(gOverallTiming, kTaskPreProcessing);
         StopTiming(gOverallTiming, kTaskTotal);

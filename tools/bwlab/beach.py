@@ -84,6 +84,29 @@ def write_grid(path, values, dx):
             f.write(" ".join(f"{v:.6f}" for v in values[k]) + "\n")
 
 
+def flume_sections(bathymetry, steps, dt, warm_up):
+    """The sections both kinds of model share: the bed, the land level and
+    the run's period."""
+    return f"""    Bathymetry_Selection {{
+        Hot_Start = false
+        DATA_FILE {{
+            File_name = file("{bathymetry}")
+            Item_Count = 1
+            Item_Numbers = 1
+        }}
+    }}
+    Area_Description {{
+        True_land_value = 0.5
+        Reference_Level_Shift = 0
+    }}
+    Simulation_Period {{
+        Time_step_count = {steps}
+        Time_step_interval = {dt:.10f}
+        Warm_up_period = {warm_up}
+        Start_time = 2026, 1, 1, 12, 0, 0
+    }}"""
+
+
 def wave_maker(a, ny):
     """The sections that make the waves: a level boundary at the west end,
     or a generation line (a.source, the grid column) with a sponge behind it."""
@@ -156,24 +179,7 @@ TARNEL_BOUSSINESQ_WAVE {{
     BASIC_MODEL_PARAMETERS {{
         NUMBER_OF_DIMENSIONS = 2
     }}
-    Bathymetry_Selection {{
-        Hot_Start = false
-        DATA_FILE {{
-            File_name = file("bathymetry.xol2")
-            Item_Count = 1
-            Item_Numbers = 1
-        }}
-    }}
-    Area_Description {{
-        True_land_value = 0.5
-        Reference_Level_Shift = 0
-    }}
-    Simulation_Period {{
-        Time_step_count = {steps}
-        Time_step_interval = {dt:.10f}
-        Warm_up_period = {a.steps_per_period * 3}
-        Start_time = 2026, 1, 1, 12, 0, 0
-    }}
+{flume_sections("bathymetry.xol2", steps, dt, a.steps_per_period * 3)}
     Equation_Parameters {{
 {body("Equation_Parameters")}
     }}
@@ -336,24 +342,7 @@ TARNEL_BOUSSINESQ_WAVE {{
         NUMBER_OF_DIMENSIONS = 1
         DELETE_FEM_KVT_FILE = 0
     }}
-    Bathymetry_Selection {{
-        Hot_Start = false
-        DATA_FILE {{
-            File_name = file("bathymetry.xol1")
-            Item_Count = 1
-            Item_Numbers = 1
-        }}
-    }}
-    Area_Description {{
-        True_land_value = 0.5
-        Reference_Level_Shift = 0
-    }}
-    Simulation_Period {{
-        Time_step_count = {steps}
-        Time_step_interval = {dt:.10f}
-        Warm_up_period = 0
-        Start_time = 2026, 1, 1, 12, 0, 0
-    }}
+{flume_sections("bathymetry.xol1", steps, dt, 0)}
     Equation_Parameters {{
 {body("Equation_Parameters")}
     }}
